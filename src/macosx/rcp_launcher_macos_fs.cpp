@@ -1,0 +1,397 @@
+// File-system services of the launcher: directory creation and removal, the
+// text copy of the launcher's own files, rename/delete, the existence tests,
+// the one-item reader used by the properties code, and wide-oriented streams.
+//
+// Every wide path is converted to the locale's multibyte form right before the
+// system call. Nothing here writes to the log except copyFile, whose failures
+// end the launch; everything else answers through its 1/0 result and leaves
+// errno as the failing call set it.
+#include <dirent.h>
+#include <sys/stat.h>
+#include <sys/types.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <cwchar>
+#include <string>
+
+#include "rcp_launcher.h"
+
+namespace {
+
+const mode_t DIRECTORY_MODE = 0775;
+
+// Size of the scratch area that receives one scanned item (bytes).
+const size_t READ_SCRATCH_SIZE = 204800;
+
+// fgetws buffer: up to 1000 characters per read plus the terminator.
+const int COPY_BUFFER_CHARS = 1001;
+
+// One line of the removal error list. errno is handed in explicitly because it
+// has to be the value the failing call left, not whatever building the line
+// might leave behind.
+void appendError(std::string& errlist, const char* prefix, const std::string& path, int savedErrno)
+{
+    std::string reason;
+    errno = savedErrno;
+    GetLastErrorMsg(reason);
+    errlist += prefix;
+    errlist += path;
+    errlist += "  - ";
+    errlist += reason;
+    errlist += "\n";
+}
+
+std::string toNarrow(const wchar_t* path)
+{
+    std::string out;
+    wcstochar(out, path);
+    return out;
+}
+
+// Checks the caller's scanf format and returns a copy that can only ever write
+// into the scratch area: exactly one assigning conversion of the kinds s, c or
+// [...] (no length modifier), with a field width that fits the scratch area
+// (a missing width is supplied). Returns false for anything else, which
+// would make fscanf write through arguments that do not exist.
+bool boundedFormat(const std::string& fmt, std::string& out, size_t& width)
+{
+    out.clear();
+    width = 0;
+    int assigning = 0;
+    size_t i = 0;
+    while (i < fmt.size()) {
+        char ch = fmt[i];
+        out += ch;
+        ++i;
+        if (ch != '%') {
+            continue;
+        }
+        if (i < fmt.size() && fmt[i] == '%') {
+            out += '%';
+            ++i;
+            continue;
+        }
+        bool suppressed = false;
+        if (i < fmt.size() && fmt[i] == '*') {
+            suppressed = true;
+            out += '*';
+            ++i;
+        }
+        size_t start = i;
+        size_t w = 0;
+        while (i < fmt.size() && fmt[i] >= '0' && fmt[i] <= '9') {
+            if (w < READ_SCRATCH_SIZE) {
+                w = w * 10 + static_cast<size_t>(fmt[i] - '0');
+            }
+            ++i;
+        }
+        bool hasWidth = i > start;
+        if (i >= fmt.size()) {
+            return false;
+        }
+        char conv = fmt[i];
+        if (conv != 's' && conv != 'c' && conv != '[') {
+            // Length modifiers and numeric conversions are not expected here.
+            if (suppressed && (conv == 'd' || conv == 'i' || conv == 'u' || conv == 'x')) {
+                out.append(fmt, start, i - start + 1);
+                ++i;
+                continue;
+            }
+            return false;
+        }
+        if (!suppressed) {
+            ++assigning;
+            if (!hasWidth) {
+                w = (conv == 'c') ? 1 : READ_SCRATCH_SIZE - 1;
+            }
+            if (w == 0 || w >= READ_SCRATCH_SIZE) {
+                return false;
+            }
+            width = w;
+            out += std::to_string(w);
+        } else {
+            out.append(fmt, start, i - start);
+        }
+        out += conv;
+        ++i;
+        if (conv == '[') {
+            // The scan set: a leading '^' and a leading ']' belong to the set.
+            if (i < fmt.size() && fmt[i] == '^') {
+                out += fmt[i++];
+            }
+            if (i < fmt.size() && fmt[i] == ']') {
+                out += fmt[i++];
+            }
+            while (i < fmt.size() && fmt[i] != ']') {
+                out += fmt[i++];
+            }
+            if (i >= fmt.size()) {
+                return false;
+            }
+            out += fmt[i++];
+        }
+    }
+    return assigning == 1;
+}
+
+}  // namespace
+
+int createDirectory(const wchar_t* dir)
+{
+    if (dir == nullptr) {
+        return 0;
+    }
+    std::string path = toNarrow(dir);
+    return mkdir(path.c_str(), DIRECTORY_MODE) == 0 ? 1 : 0;
+}
+
+int removeDirectoryContents(const std::string& dir, std::string& indent, std::string& errlist)
+{
+    int result = 1;
+    DIR* listing = opendir(dir.c_str());
+    if (listing == nullptr) {
+        appendError(errlist, "Error in ", dir, errno);
+        return 0;
+    }
+    // errno tells the end of the listing from a listing error, so it is cleared
+    // before every read and after every entry.
+    errno = 0;
+    struct dirent* entry;
+    while ((entry = readdir(listing)) != nullptr) {
+        const char* name = entry->d_name;
+        if (std::strcmp(name, ".") != 0 && std::strcmp(name, "..") != 0) {
+            std::string full = dir + "/" + name;
+            struct stat st;
+            if (stat(full.c_str(), &st) != 0) {
+                appendError(errlist, "Can't stat ", full, errno);
+                result = 0;
+            } else if (S_ISDIR(st.st_mode)) {
+                std::string deeper = indent + "  ";
+                int sub = removeDirectoryContents(full, deeper, errlist);
+                result = result && sub;
+                if (rmdir(full.c_str()) != 0) {
+                    appendError(errlist, "Can't delete dir ", full, errno);
+                    result = 0;
+                }
+            } else if (unlink(full.c_str()) != 0) {
+                appendError(errlist, "Can't delete file ", full, errno);
+                result = 0;
+            }
+        }
+        errno = 0;
+    }
+    if (errno != 0) {
+        appendError(errlist, "readdir error ", "", errno);
+        result = 0;
+    }
+    closedir(listing);
+    return result;
+}
+
+int removeDirectoryContents(const std::wstring& dir, std::wstring& errlist)
+{
+    std::string narrowDir;
+    wstrtocs(narrowDir, dir);
+    std::string indent;
+    std::string narrowList;
+    int result = removeDirectoryContents(narrowDir, indent, narrowList);
+    if (!result) {
+        chartowstr(narrowList.c_str(), errlist);
+    }
+    return result;
+}
+
+int removeDirectoryAndContents(const std::wstring& dir, std::wstring& errlist)
+{
+    std::string narrowDir;
+    wstrtocs(narrowDir, dir);
+    std::string indent;
+    std::string narrowList;
+    int result = removeDirectoryContents(narrowDir, indent, narrowList);
+    if (result && rmdir(narrowDir.c_str()) != 0) {
+        appendError(narrowList, "Can't delete dir ", narrowDir, errno);
+        result = 0;
+    }
+    if (!result) {
+        chartowstr(narrowList.c_str(), errlist);
+    }
+    return result;
+}
+
+int copyFile(const wchar_t* origFile, const wchar_t* newFile)
+{
+    const wchar_t* origText = origFile != nullptr ? origFile : L"";
+    const wchar_t* newText = newFile != nullptr ? newFile : L"";
+    FILE* in = nullptr;
+    if (origFile != nullptr) {
+        open_wfile(in, origFile, L"r");
+    }
+    if (in == nullptr) {
+        fatalErrorA("RLNCH0190E: Unable to open source file %ls to be copied", origText, true);
+        return 0;
+    }
+    FILE* out = nullptr;
+    if (newFile != nullptr) {
+        open_wfile(out, newFile, L"w+");
+    }
+    if (out == nullptr) {
+        fclose(in);
+        fatalErrorA("RLNCH0191E: Unable to open destination file %ls to be copied to", newText, true);
+        return 0;
+    }
+    wchar_t buffer[COPY_BUFFER_CHARS];
+    while (fgetws(buffer, COPY_BUFFER_CHARS, in) != nullptr) {
+        if (fputws(buffer, out) < 0) {
+            fclose(in);
+            fclose(out);
+            fatalErrorA("RLNCH0192E: Encountered error copying file contents", true);
+            return 0;
+        }
+    }
+    if (!feof(in)) {
+        fclose(in);
+        fclose(out);
+        fatalErrorA("RLNCH0193E: Did not encounter EOF while copying file contents", true);
+        return 0;
+    }
+    fclose(in);
+    // Buffered output can still fail at the final flush (a full disk).
+    if (fclose(out) != 0) {
+        fatalErrorA("RLNCH0192E: Encountered error copying file contents", true);
+        return 0;
+    }
+    return 1;
+}
+
+int moveFile(const wchar_t* origFile, const wchar_t* newFile)
+{
+    if (origFile == nullptr || newFile == nullptr) {
+        return 0;
+    }
+    std::string from = toNarrow(origFile);
+    std::string to = toNarrow(newFile);
+    return rename(from.c_str(), to.c_str()) == 0 ? 1 : 0;
+}
+
+int deleteFile(const wchar_t* file)
+{
+    if (file == nullptr) {
+        return 0;
+    }
+    std::string path = toNarrow(file);
+    return unlink(path.c_str()) == 0 ? 1 : 0;
+}
+
+int existsA(const char* file)
+{
+    if (file == nullptr) {
+        return 0;
+    }
+    FILE* fp = fopen(file, "rb");
+    if (fp == nullptr) {
+        return 0;
+    }
+    fclose(fp);
+    return 1;
+}
+
+int exists(const wchar_t* file)
+{
+    if (file == nullptr) {
+        return 0;
+    }
+    std::string path = toNarrow(file);
+    return existsA(path.c_str());
+}
+
+int isDirectory(const wchar_t* file)
+{
+    if (file == nullptr) {
+        return 0;
+    }
+    std::string path = toNarrow(file);
+    struct stat st;
+    if (lstat(path.c_str(), &st) != 0) {
+        return 0;
+    }
+    return S_ISDIR(st.st_mode) ? 1 : 0;
+}
+
+int isExecutable(const wchar_t* file)
+{
+    if (file == nullptr) {
+        return 0;
+    }
+    std::string path = toNarrow(file);
+    struct stat st;
+    if (stat(path.c_str(), &st) != 0) {
+        return 0;
+    }
+    return (st.st_mode & 0100) != 0 ? 1 : 0;
+}
+
+int readFile(FILE* inX, const wchar_t* mode, std::wstring& inputLineX)
+{
+    // The properties reader calls this once per line; one scratch area serves
+    // every call instead of a fresh 200 KB allocation each time.
+    static char scratch[READ_SCRATCH_SIZE];
+    inputLineX.clear();
+    if (inX == nullptr || mode == nullptr) {
+        return EOF;
+    }
+    std::string format;
+    wcstochar(format, mode);
+    std::string safeFormat;
+    size_t width = 0;
+    if (!boundedFormat(format, safeFormat, width)) {
+        // A format that could write past the scratch area (or through a
+        // missing argument) is never handed to fscanf; ending the caller's read
+        // loop is the only safe answer.
+        return EOF;
+    }
+    scratch[0] = '\0';
+    scratch[width] = '\0';  // %c conversions do not terminate their field
+    int result = fscanf(inX, safeFormat.c_str(), scratch);
+    if (result >= 1) {
+        chartowstr(scratch, inputLineX);
+    }
+    return result;
+}
+
+void open_wfile(FILE*& inX, const wchar_t* file, const wchar_t* mode)
+{
+    inX = nullptr;
+    if (file == nullptr || mode == nullptr) {
+        return;
+    }
+    std::string path = toNarrow(file);
+    std::string narrowMode = toNarrow(mode);
+    FILE* fp = fopen(path.c_str(), narrowMode.c_str());
+    if (fp != nullptr) {
+        fwide(fp, 1);
+    }
+    inX = fp;
+}
+
+const wchar_t* getUserHome(std::wstring& envHome)
+{
+    if (getEnv(USER_HOME, envHome) == nullptr) {
+        envHome.clear();
+    }
+    return envHome.c_str();
+}
+
+void sysSleep(int seconds)
+{
+    if (seconds <= 0) {
+        return;
+    }
+    // sleep returns early when a signal arrives; finish the remaining time.
+    unsigned int left = static_cast<unsigned int>(seconds);
+    while (left > 0) {
+        left = sleep(left);
+    }
+}
