@@ -1,0 +1,306 @@
+// Where the launcher is installed, found from its own executable, and the
+// session-ending routines that this platform keeps for the common code.
+//
+// The operating system is asked for the executable's path; the command line's
+// program name is never trusted, since a desktop shortcut or a relative call
+// may name the launcher in any way.
+#if defined(__APPLE__)
+#include <mach-o/dyld.h>
+#endif
+#include <dirent.h>
+#include <dlfcn.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <climits>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <cwchar>
+#include <string>
+#include <vector>
+
+#include "rcp_launcher.h"
+
+char tempOutBuffer[TEMP_OUT_BUFFER_SIZE];
+
+namespace {
+
+// The executable path buffer: 1024 bytes of path plus the terminator.
+const size_t EXE_PATH_BUFFER = 1025;
+// readsymln's buffer; a target that fills it may have been cut.
+const size_t LINK_BUFFER = 1024;
+// Longest executable path accepted from the system when the first buffer is
+// too small.
+const size_t EXE_PATH_LIMIT = 65536;
+
+// The record written to the session command file; both fields are
+// NUL-terminated and zero-filled behind the text.
+struct PostSessionCommand {
+    char command[256];
+    char parameter[256];
+};
+
+[[noreturn]] void executablePathFailed(int err)
+{
+    snprintf(tempOutBuffer, sizeof(tempOutBuffer), "RLNCH0184E: Getting executable path failed! errno = %d", err);
+    fatalErrorA(tempOutBuffer, true);
+    exit(-1);  // not reached: fatalErrorA with its exit flag ends the process
+}
+
+// The raw path of the running executable as the system reports it.
+std::string systemExecutablePath()
+{
+#if defined(__APPLE__)
+    std::vector<char> buffer(EXE_PATH_BUFFER, '\0');
+    uint32_t size = static_cast<uint32_t>(buffer.size());
+    if (_NSGetExecutablePath(buffer.data(), &size) != 0) {
+        // The buffer was too small; size now holds what is needed.
+        if (size == 0 || size > EXE_PATH_LIMIT) {
+            executablePathFailed(errno);
+        }
+        buffer.assign(static_cast<size_t>(size) + 1, '\0');
+        size = static_cast<uint32_t>(buffer.size());
+        if (_NSGetExecutablePath(buffer.data(), &size) != 0) {
+            executablePathFailed(errno);
+        }
+    }
+    buffer.back() = '\0';
+    return std::string(buffer.data());
+#else
+    // readlink does not terminate and silently cuts a long target, so the
+    // buffer grows until the answer fits with room to spare.
+    for (size_t size = EXE_PATH_BUFFER; size <= EXE_PATH_LIMIT; size *= 4) {
+        std::vector<char> buffer(size, '\0');
+        ssize_t n = readlink("/proc/self/exe", buffer.data(), buffer.size());
+        if (n < 0) {
+            executablePathFailed(errno);
+        }
+        if (static_cast<size_t>(n) < buffer.size()) {
+            return std::string(buffer.data(), static_cast<size_t>(n));
+        }
+    }
+    executablePathFailed(ENAMETOOLONG);
+#endif
+}
+
+// Cuts s at its last '/', dropping the separator and what follows. Returns
+// false (s unchanged) when there is no '/'.
+bool cutAtLastSlash(std::wstring& s)
+{
+    size_t p = s.rfind(L'/');
+    if (p == std::wstring::npos) {
+        return false;
+    }
+    s.erase(p);
+    return true;
+}
+
+// A /proc entry name that reads as a process id of at least 1.
+bool isProcessNumber(const char* name)
+{
+    if (name == nullptr || *name == '\0') {
+        return false;
+    }
+    char* end = nullptr;
+    errno = 0;
+    long value = strtol(name, &end, 10);
+    return errno == 0 && end != name && *end == '\0' && value >= 1;
+}
+
+}  // namespace
+
+void read_executable_path(std::string& path)
+{
+    std::string raw = systemExecutablePath();
+    char* resolved = realpath(raw.c_str(), nullptr);
+    if (resolved == nullptr) {
+        path.clear();
+    } else {
+        path = resolved;
+        free(resolved);
+    }
+    SvcDebugOutA(path.c_str());
+}
+
+void readsymln(std::string& target, const char* link)
+{
+    char buffer[LINK_BUFFER];
+    ssize_t n = -1;
+    if (link == nullptr) {
+        errno = EINVAL;
+    } else {
+        n = readlink(link, buffer, sizeof(buffer));
+    }
+    if (n < 0 || static_cast<size_t>(n) >= sizeof(buffer)) {
+        snprintf(tempOutBuffer, sizeof(tempOutBuffer), "RLNCH0184E: Getting command path failed! errno = %d", errno);
+        fatalErrorA(tempOutBuffer, true);
+        return;
+    }
+    target.assign(buffer, static_cast<size_t>(n));
+}
+
+// cmd must be null or a String of this program (newString/chartowcs): it is
+// released and replaced by a new String holding the launcher's directory.
+// arg, the program name from the command line, is deliberately not used.
+void findCommand(wchar_t*& cmd, wchar_t* arg)
+{
+    (void)arg;
+    std::string path;
+    read_executable_path(path);
+    std::wstring dir;
+    chartowstr(path.c_str(), dir);
+    cutAtLastSlash(dir);
+    freeString(cmd);
+    cmd = copyString(dir.c_str());
+}
+
+wchar_t* getRCPDirectory(int argc, wchar_t** argv)
+{
+    wchar_t* dir = newString(1024);
+    findCommand(dir, (argc > 0 && argv != nullptr) ? argv[0] : nullptr);
+    if (isDirectory(dir)) {
+        return dir;
+    }
+    freeString(dir);
+    return nullptr;
+}
+
+void getInstallDir(std::wstring& installDir, int argc, wchar_t** argv)
+{
+    wchar_t* dir = getRCPDirectory(argc, argv);
+    if (dir == nullptr) {
+        installDir.clear();
+        fatalErrorA("RLNCH0049E: Unable to locate the platform's installation directory", true);
+        return;
+    }
+    std::wstring candidate(dir);
+    freeString(dir);
+    size_t p = candidate.rfind(L'/');
+    if (p != std::wstring::npos && candidate.compare(p + 1, std::wstring::npos, L"rcp") == 0) {
+        candidate.erase(p);
+        if (isDirectory(candidate.c_str())) {
+            installDir = candidate;
+            return;
+        }
+    }
+    // Not laid out as <install>/rcp/<launcher>: an empty installation path,
+    // which makes every later path relative to the root.
+    installDir.clear();
+}
+
+void getLauncherPath(std::wstring& path)
+{
+    std::string narrowPath;
+    read_executable_path(narrowPath);
+    chartowstr(narrowPath.c_str(), path);
+}
+
+void getServiceInstallDir(std::wstring& serviceDir, std::wstring& installDir, int argc, wchar_t** argv)
+{
+    wchar_t* found = nullptr;
+    findCommand(found, (argc > 0 && argv != nullptr) ? argv[0] : nullptr);
+    std::wstring cmd(found != nullptr ? found : L"");
+    freeString(found);
+    // The service directory is two levels and the installation six levels
+    // above the launcher's directory.
+    for (int pass = 0; pass <= 5; ++pass) {
+        cutAtLastSlash(cmd);
+        if (pass == 1 && isDirectory(cmd.c_str())) {
+            serviceDir = cmd;
+        }
+        if (pass == 5 && isDirectory(cmd.c_str())) {
+            installDir = cmd;
+            return;
+        }
+    }
+    const wchar_t* program = (argc > 0 && argv != nullptr && argv[0] != nullptr) ? argv[0] : L"";
+    fatalErrorA("RLNCH0048E: Unable to locate the directory containing %ls", program, true);
+}
+
+const wchar_t* getOS()
+{
+    return L"macosx";
+}
+
+int shutdown()
+{
+    FILE* fp = fopen(CMD_FILE, "w");
+    if (fp == nullptr) {
+        return 0;
+    }
+    PostSessionCommand record;
+    memset(&record, 0, sizeof(record));
+    snprintf(record.command, sizeof(record.command), "%s", "shutdown");
+    snprintf(record.parameter, sizeof(record.parameter), "%s", "1");
+    fwrite(&record, sizeof(record), 1, fp);
+    fclose(fp);
+    return logoff();
+}
+
+int logoff()
+{
+    void* handle = dlopen("./lockdown.so", RTLD_LAZY);
+    if (handle == nullptr) {
+        if (system("killall gnome-session") == -1) {
+            // Nothing more can be done to end the session.
+        }
+        exit(1);
+    }
+    dlerror();
+    void* symbol = dlsym(handle, "logoff");
+    if (dlerror() != nullptr || symbol == nullptr) {
+        dlclose(handle);
+        if (system("killall gnome-session") == -1) {
+            // Nothing more can be done to end the session.
+        }
+        exit(1);
+    }
+    int (*sessionLogoff)() = reinterpret_cast<int (*)()>(symbol);
+    int result = sessionLogoff();
+    dlclose(handle);
+    return result;
+}
+
+int findRCP()
+{
+    static const char SUFFIX[] = "/eclipse";
+    const size_t suffixLength = sizeof(SUFFIX) - 1;
+    for (int attempt = 0; attempt < MAX_RETRIES; ++attempt) {
+        DIR* proc = opendir("/proc");
+        if (proc != nullptr) {
+            struct dirent* entry;
+            while ((entry = readdir(proc)) != nullptr) {
+                if (!isProcessNumber(entry->d_name)) {
+                    continue;
+                }
+                char cmdlinePath[PATH_MAX];
+                int n = snprintf(cmdlinePath, sizeof(cmdlinePath), "/proc/%s/cmdline", entry->d_name);
+                if (n < 0 || static_cast<size_t>(n) >= sizeof(cmdlinePath)) {
+                    continue;
+                }
+                FILE* fp = fopen(cmdlinePath, "r");
+                if (fp == nullptr) {
+                    continue;
+                }
+                char line[1025];
+                line[0] = '\0';
+                char* got = fgets(line, sizeof(line), fp);
+                fclose(fp);
+                if (got == nullptr) {
+                    continue;
+                }
+                // The command line is NUL-separated: the text is the program.
+                size_t length = strlen(line);
+                if (length > suffixLength && strcmp(line + length - suffixLength, SUFFIX) == 0) {
+                    int found = static_cast<int>(strtol(entry->d_name, nullptr, 10));
+                    closedir(proc);
+                    return found;
+                }
+            }
+            closedir(proc);
+        }
+        sleep(1);
+    }
+    return 0;
+}

@@ -1,0 +1,191 @@
+// The file side of the platform lock: creating and opening the lock file,
+// the exclusive flock, and reading and writing the recorded process id.
+//
+// The content is the platform's process id in decimal followed by ten blanks,
+// always written from the start of the file and never truncated: the blanks
+// cover the tail of a longer id left by an earlier launch.
+#include <fcntl.h>
+#include <signal.h>
+#include <sys/file.h>
+#include <sys/types.h>
+#include <unistd.h>
+
+#include <cctype>
+#include <cerrno>
+#include <climits>
+#include <cstdio>
+#include <string>
+
+#include "rcp_launcher.h"
+
+namespace {
+
+// Keeps a descriptor out of programs started with execv. The flock belongs to
+// the open file description, which a child would share: a JVM that inherited
+// it could hold the lock for its whole life if this launcher died before
+// unlocking, and every later launcher of the workspace would block on it.
+void closeOnExec(int fd)
+{
+    if (fd < 0) {
+        return;
+    }
+    int flags = fcntl(fd, F_GETFD);
+    if (flags != -1) {
+        fcntl(fd, F_SETFD, flags | FD_CLOEXEC);
+    }
+}
+
+}  // namespace
+
+void createAndOpenLockFile()
+{
+    std::string path;
+    wcstochar(path, lockFilePath.c_str());
+    // This descriptor only makes sure the file exists; the stream below is the
+    // one that is locked and kept.
+    int fd = open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600);
+    if (fd < 0) {
+        SvcDebugOutA("RLNCH0199E: CreateLockFile failed. errno=%d", errno);
+    } else {
+        close(fd);
+    }
+    if (lockFILE != nullptr) {
+        // A second call in one process must not leave the first stream (and
+        // any lock on it) behind.
+        fclose(lockFILE);
+        lockFILE = nullptr;
+    }
+    open_file(lockFILE, lockFilePath.c_str(), L"r+");
+    if (lockFILE == nullptr) {
+        fatalErrorA("RLNCH0054E: Error locating platform lock file", true);
+        return;
+    }
+    closeOnExec(fileno(lockFILE));
+}
+
+void lockLockFile(const std::wstring& sidFilePath)
+{
+    if (lockFILE == nullptr) {
+        fatalErrorA("RLNCH0054E: Error locating platform lock file", true);
+        return;
+    }
+    // Blocks while another launcher of this workspace holds the lock, that is
+    // until it has started its child.
+    while (flock(fileno(lockFILE), LOCK_EX) != 0) {
+        if (errno == EINTR) {
+            continue;
+        }
+        fatalError("RLNCH0053E: Error locking platform lock file. errno=%d", errno);
+        // Keep trying, but without flooding the log.
+        sysSleep(1);
+    }
+    if (!checkLockFile()) {
+        setMainProcess(true);
+        exists(sidFilePath.c_str());
+        deleteFile(sidFilePath.c_str());
+    }
+}
+
+void populateLockFile(int childPid)
+{
+    if (!isMainProcess() || lockFILE == nullptr) {
+        return;
+    }
+    int written = -1;
+    if (fseek(lockFILE, 0, SEEK_SET) == 0) {
+        written = fprintf(lockFILE, "%ld          ", static_cast<long>(childPid));
+    }
+    if (fflush(lockFILE) != 0 || written < 0) {
+        SvcDebugOutA("RLNCH0051E: Unable to write to platform lock file");
+    }
+}
+
+void invalidateLockFile()
+{
+    int written = -1;
+    if (lockFILE != nullptr && fseek(lockFILE, 0, SEEK_SET) == 0) {
+        written = fprintf(lockFILE, "%s", "              ");
+        if (fflush(lockFILE) != 0) {
+            written = -1;
+        }
+    }
+    if (written < 0) {
+        SvcDebugOutA("RLNCH0052E: Unable to invalidate platform lock file");
+    }
+}
+
+void unlockLockFile()
+{
+    if (lockFILE == nullptr) {
+        return;
+    }
+    if (flock(fileno(lockFILE), LOCK_UN) != 0) {
+        fatalError("RLNCH0070E: Error unlocking platform lock file. errno=%d", errno);
+    }
+}
+
+// Reads the id the way fscanf("%ld") would (blanks skipped, optional sign,
+// digits), but without the undefined behaviour of an out-of-range number:
+// a value that does not fit is clamped like strtol does. Returns EOF when the
+// file holds nothing but white space, 0 when the first non-blank is not a
+// number, 1 with *pidOut set otherwise.
+int readLockFilePid(long* pidOut)
+{
+    if (lockFILE == nullptr || fseek(lockFILE, 0, SEEK_SET) != 0) {
+        return EOF;
+    }
+    clearerr(lockFILE);
+    int ch = fgetc(lockFILE);
+    while (ch != EOF && isspace(ch)) {
+        ch = fgetc(lockFILE);
+    }
+    if (ch == EOF) {
+        return EOF;
+    }
+    bool negative = false;
+    if (ch == '+' || ch == '-') {
+        negative = (ch == '-');
+        ch = fgetc(lockFILE);
+    }
+    if (ch == EOF || !isdigit(ch)) {
+        return 0;
+    }
+    unsigned long magnitude = 0;
+    const unsigned long limit = negative ? static_cast<unsigned long>(LONG_MAX) + 1UL : LONG_MAX;
+    while (ch != EOF && isdigit(ch)) {
+        unsigned long digit = static_cast<unsigned long>(ch - '0');
+        if (magnitude > (limit - digit) / 10) {
+            magnitude = limit;
+        } else {
+            magnitude = magnitude * 10 + digit;
+        }
+        ch = fgetc(lockFILE);
+    }
+    long value;
+    if (negative) {
+        value = magnitude == static_cast<unsigned long>(LONG_MAX) + 1UL ? LONG_MIN
+                                                                        : -static_cast<long>(magnitude);
+    } else {
+        value = static_cast<long>(magnitude);
+    }
+    if (pidOut != nullptr) {
+        *pidOut = value;
+    }
+    return 1;
+}
+
+// Only a missing process (ESRCH) counts as dead; a process of another user
+// (EPERM) is alive. Ids that cannot name a single process - zero and negative
+// values address process groups, larger ones do not fit a pid_t - are
+// treated as dead rather than tested, since kill would answer for other
+// processes.
+bool isProcessAlive(long processId)
+{
+    if (processId <= 0 || processId > static_cast<long>(INT_MAX)) {
+        return false;
+    }
+    if (kill(static_cast<pid_t>(processId), 0) == 0) {
+        return true;
+    }
+    return errno != ESRCH;
+}
