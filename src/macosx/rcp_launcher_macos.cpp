@@ -22,8 +22,6 @@
 
 #include "rcp_launcher.h"
 
-char tempOutBuffer[TEMP_OUT_BUFFER_SIZE];
-
 namespace {
 
 // The executable path buffer: 1024 bytes of path plus the terminator.
