@@ -1,0 +1,50 @@
+// The launcher's own options: one search primitive over its arguments, the
+// predicates built on it, and the process-wide flags they steer.
+#include <cwchar>
+
+#include "rcp_launcher.h"
+
+bool bWaitMode = false;
+bool runningLock = false;
+
+int findOption(const wchar_t* opt, int argc, wchar_t** argv) {
+    if (opt == nullptr || argv == nullptr) return -1;
+    for (int i = 1; i < argc; ++i) {
+        if (argv[i] != nullptr && wcscmp(argv[i], opt) == 0) return i;
+    }
+    return -1;
+}
+
+bool isDebug(int argc, wchar_t** argv) {
+    // A restarted launcher never writes debug output.
+    if (findOption(RESTARTARG, argc, argv) != -1) return false;
+    return findOption(DEBUGARG, argc, argv) != -1;
+}
+
+bool isRestart(int argc, wchar_t** argv) { return findOption(RESTARTARG, argc, argv) != -1; }
+
+bool isResetConfig(int argc, wchar_t** argv) { return findOption(RESETCONFIGARG, argc, argv) != -1; }
+
+bool isVmOverride(int argc, wchar_t** argv) { return findOption(VMARG, argc, argv) != -1; }
+
+bool isISMPProvisioning(int argc, wchar_t** argv) {
+    return findOption(RCPLAUNCHERWAIT, argc, argv) != -1 && findOption(PROVMANIFESTARG, argc, argv) != -1;
+}
+
+bool isInitMUService(int argc, wchar_t** argv) { return findOption(INITMUSERVICEARG, argc, argv) != -1; }
+
+void doVersionCheck(int argc, wchar_t** argv) {
+    if (findOption(VERSIONARG, argc, argv) != -1) fatalErrorA("RLNCH0031I:   version = \"%ls\"", BUILDDATE, true);
+}
+
+void getCmdString(int /*argc*/, wchar_t** /*argv*/) {}
+
+void setWaitMode() { bWaitMode = true; }
+
+bool isWaitMode() { return bWaitMode; }
+
+void setMainProcess(bool val) { runningLock = val; }
+
+bool isMainProcess() { return runningLock; }
+
+bool isLockdownConfig() { return IS_LOCKDOWN; }

@@ -1,0 +1,28 @@
+// Owned wide C strings. An allocation failure cannot be recovered from in a
+// launcher, so it ends the launch through the fatal path.
+#include <cstdlib>
+#include <cwchar>
+
+#include "rcp_launcher.h"
+
+String newString(unsigned long len) {
+    String s = static_cast<String>(malloc((len + 1) * sizeof(wchar_t)));
+    if (s == nullptr) {
+        fatalErrorA("RLNCH0004E: newString malloc failed!", true);
+        return nullptr;
+    }
+    s[0] = 0;
+    return s;
+}
+
+String freeString(String s) {
+    if (s != nullptr) free(s);
+    return nullptr;
+}
+
+String initMemString(String str1, const wchar_t* str2) { return wcscat(str1, str2); }
+
+String copyString(const wchar_t* text) {
+    if (text == nullptr) text = L"";
+    return initMemString(newString(wcslen(text) + 1), text);
+}

@@ -1,0 +1,31 @@
+#!/usr/bin/env bash
+# Builds and runs every test: a normal build with warnings as errors, the same
+# suite under AddressSanitizer + UndefinedBehaviorSanitizer, and short bounded
+# fuzzing runs built with clang.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+root=$(pwd)
+
+scripts/install-deps.sh
+
+jobs=$(nproc 2>/dev/null || echo 2)
+
+echo "=== Normal build (-Wall -Wextra -Werror) ==="
+cmake -S "$root" -B "$root/build" -DRCP_WERROR=ON -DRCP_SANITIZE=OFF >/dev/null
+cmake --build "$root/build" -j"$jobs"
+(cd "$root/build" && ctest --output-on-failure)
+
+echo "=== Sanitizer build (address, undefined) ==="
+cmake -S "$root" -B "$root/build-asan" -DRCP_WERROR=ON -DRCP_SANITIZE=ON >/dev/null
+cmake --build "$root/build-asan" -j"$jobs"
+(cd "$root/build-asan" && \
+  ASAN_OPTIONS=detect_leaks=1:abort_on_error=1 UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 \
+  ctest --output-on-failure)
+
+if [ -f "$root/fuzz/CMakeLists.txt" ]; then
+  echo "=== Fuzzing (clang, libFuzzer, bounded runs) ==="
+  cmake -S "$root" -B "$root/build-fuzz" -DCMAKE_C_COMPILER=clang -DCMAKE_CXX_COMPILER=clang++ \
+    -DRCP_FUZZ=ON >/dev/null
+  cmake --build "$root/build-fuzz" -j"$jobs"
+  (cd "$root/build-fuzz" && ctest -L fuzz --output-on-failure)
+fi

@@ -1,0 +1,298 @@
+// The launcher's only output channel: a log file chosen late in the startup.
+// Until that file is open every line waits in an in-memory queue, so that a
+// launch that dies early still leaves its whole story in /tmp/rcplauncher.log.
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdarg>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <string>
+
+#include "rcp_launcher.h"
+
+char tempOutBuffer[TEMP_OUT_BUFFER_SIZE];
+
+namespace {
+
+constexpr size_t LINE_BUFFER_SIZE = 4096;
+constexpr size_t MAX_DEBUG_FORMAT = 1000;
+
+bool debug = true;
+FILE* logFILE = nullptr;
+std::string logque;
+
+void addcstr_to_logque(const char* str) { logque += str; }
+
+void writeLine(const std::string& line) {
+    if (logFILE != nullptr) {
+        fflush(logFILE);
+        fputs(line.c_str(), logFILE);
+        fflush(logFILE);
+    } else {
+        addcstr_to_logque(line.c_str());
+    }
+}
+
+// vsnprintf into the fixed line buffer; a format error yields an empty text
+// rather than whatever the buffer held.
+size_t formatInto(char* buf, size_t size, const char* fmt, va_list ap) {
+    int n = vsnprintf(buf, size, fmt, ap);
+    if (n < 0) {
+        buf[0] = '\0';
+        return 0;
+    }
+    return static_cast<size_t>(n) >= size ? size - 1 : static_cast<size_t>(n);
+}
+
+void output_doit(const char* fmt, va_list ap) {
+    char buf[LINE_BUFFER_SIZE];
+    formatInto(buf, sizeof buf, fmt, ap);
+    std::string line(buf);
+    line += '\n';
+    writeLine(line);
+}
+
+void Output(const char* fmt, ...) __attribute__((format(printf, 1, 2)));
+void Output(const char* fmt, ...) {
+    va_list ap;
+    va_start(ap, fmt);
+    output_doit(fmt, ap);
+    va_end(ap);
+}
+
+void err_doit(int savedErrno, const char* fmt, va_list ap) {
+    char buf[LINE_BUFFER_SIZE];
+    size_t len = formatInto(buf, sizeof buf, fmt, ap);
+    snprintf(buf + len, sizeof buf - len, " : %s", strerror(savedErrno));
+    std::string line(buf);
+    line += '\n';
+    writeLine(line);
+}
+
+void errorLine(const char* fmt, ...) __attribute__((format(printf, 1, 2)));
+void errorLine(const char* fmt, ...) {
+    int savedErrno = errno;
+    va_list ap;
+    va_start(ap, fmt);
+    err_doit(savedErrno, fmt, ap);
+    va_end(ap);
+}
+
+// A text that is used as a format although it may carry data. The k-th
+// conversion takes the k-th spare argument when its type fits; "%%" gives
+// "%"; any other conversion (a mismatch, one beyond the arguments, "%n", a
+// "*" width) is written as it stands instead of reading memory that was
+// never passed.
+struct SpareArg {
+    bool isInt;
+    int i;
+    const char* s;
+};
+
+std::string formatWithSpareArgs(const std::string& fmt, std::initializer_list<SpareArg> spare) {
+    std::string out;
+    const SpareArg* next = spare.begin();
+    size_t i = 0;
+    while (i < fmt.size()) {
+        if (fmt[i] != '%') {
+            out += fmt[i++];
+            continue;
+        }
+        size_t j = i + 1;
+        while (j < fmt.size() && strchr("-+ #0123456789.", fmt[j]) != nullptr) ++j;
+        if (j >= fmt.size()) {
+            out += fmt.substr(i);
+            break;
+        }
+        char conv = fmt[j];
+        std::string spec = fmt.substr(i, j - i + 1);
+        i = j + 1;
+        if (conv == '%' && spec.size() == 2) {
+            out += '%';
+            continue;
+        }
+        const SpareArg* arg = next != spare.end() ? next++ : nullptr;
+        char piece[LINE_BUFFER_SIZE];
+        if (arg != nullptr && arg->isInt && strchr("diouxXc", conv) != nullptr) {
+            snprintf(piece, sizeof piece, spec.c_str(), arg->i);
+            out += piece;
+        } else if (arg != nullptr && !arg->isInt && conv == 's') {
+            snprintf(piece, sizeof piece, spec.c_str(), arg->s ? arg->s : "(null)");
+            out += piece;
+        } else {
+            out += spec;
+        }
+    }
+    return out;
+}
+
+SpareArg intArg(int v) { return SpareArg{true, v, nullptr}; }
+SpareArg strArg(const char* v) { return SpareArg{false, 0, v}; }
+
+// The error line for a message whose one argument is wide: the argument is
+// converted here (so that any file name survives) and "%ls" becomes "%s".
+std::string narrowFormatForWideArg(const char* msg) {
+    std::string fmt(msg);
+    size_t pos = fmt.find("%ls");
+    if (pos != std::string::npos) fmt.replace(pos, 3, "%s");
+    return fmt;
+}
+
+[[noreturn]] void exitSequence() {
+    if (logFILE == nullptr) dumpLogToTempLocation();
+    exit(-1);
+}
+
+// Opens the log without following a symbolic link at its name, so that a link
+// planted at a fixed path (the /tmp fallback) is never written through.
+FILE* openLogStream(const std::string& path) {
+    int fd = open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, 0666);
+    if (fd < 0) return nullptr;
+    FILE* fp = fdopen(fd, "w+");
+    if (fp == nullptr) {
+        close(fd);
+        return nullptr;
+    }
+    fwide(fp, -1);
+    return fp;
+}
+
+}  // namespace
+
+void setDebug(bool val) { debug = val; }
+bool getDebug() { return debug; }
+
+bool enableLogging(const std::wstring& logLocation) {
+    std::wstring path = logLocation + L"/" + RCP_LOG_FILE;
+    convertToOsSeparator(path);
+    std::string npath;
+    wstrtocs(npath, path);
+    FILE* fp = openLogStream(npath);
+    if (fp == nullptr) {
+        fatalErrorA("RLNCH0019E: Could not open %ls for writing!", path.c_str(), false);
+        return false;
+    }
+    logFILE = fp;
+    fprintf(logFILE, "%s\n", logque.c_str());
+    fflush(logFILE);
+    logque.clear();
+    return true;
+}
+
+bool dumpLogToTempLocation() { return enableLogging(TEMP_LOG_DIR); }
+
+void SvcDebugOutA(const char* fString) {
+    if (!debug || fString == nullptr || strlen(fString) >= MAX_DEBUG_FORMAT) return;
+    Output("%s", fString);
+}
+
+void SvcDebugOutA(const char* fString, const char* str) {
+    if (!debug || fString == nullptr || strlen(fString) >= MAX_DEBUG_FORMAT) return;
+    std::string text = formatWithSpareArgs(fString, {strArg(str)});
+    Output("%s", text.c_str());
+}
+
+void SvcDebugOutA(const char* fString, int status) {
+    if (!debug || fString == nullptr || strlen(fString) >= MAX_DEBUG_FORMAT) return;
+    std::string text = formatWithSpareArgs(fString, {intArg(status)});
+    Output("%s", text.c_str());
+}
+
+void SvcDebugOutW(const wchar_t* fString, const wchar_t* arg) {
+    if (!debug || fString == nullptr) return;
+    std::string fmt, narg;
+    wcstochar(fmt, fString);
+    wcstochar(narg, arg ? arg : L"");
+    if (fmt.size() >= MAX_DEBUG_FORMAT) return;
+    std::string text = formatWithSpareArgs(fmt, {strArg(narg.c_str())});
+    Output("%s", text.c_str());
+}
+
+void SvcDebugOutW(const wchar_t* preString, int arg_cnt, wchar_t** sargs) {
+    if (!debug) return;
+    std::wstring assembled(preString ? preString : L"");
+    assembled += L"=\"";
+    for (int i = 0; i < arg_cnt && sargs != nullptr; ++i) {
+        assembled += sargs[i] ? sargs[i] : L"";
+        assembled += L", ";
+    }
+    assembled += L"\"\n";
+    std::string fmt;
+    wcstochar(fmt, assembled.c_str());
+    if (fmt.size() >= MAX_DEBUG_FORMAT) return;
+    // The assembled text is the format, with the count and the text as spare
+    // arguments; the line format adds its own newline after it.
+    std::string text = formatWithSpareArgs(fmt, {intArg(arg_cnt), strArg(fmt.c_str())});
+    Output("%s", text.c_str());
+}
+
+void SvcDebugLastError(const wchar_t* lpszFunction) { SvcDebugOutW(lpszFunction, L""); }
+
+void SvcDebugLastError(const wchar_t* lpszFunction, const wchar_t* subname) { SvcDebugOutW(lpszFunction, subname); }
+
+void GetLastErrorMsg(std::string& errorString) {
+    int err = errno;
+    errorString = " Failed with error " + std::to_string(err) + ": " + strerror(err);
+}
+
+void GetLastErrorMsg(std::wstring& werrorString) {
+    std::string narrow;
+    GetLastErrorMsg(narrow);
+    chartowstr(narrow.c_str(), werrorString);
+}
+
+void fatalError(const char* fmt, ...) {
+    int savedErrno = errno;
+    va_list ap;
+    va_start(ap, fmt);
+    err_doit(savedErrno, fmt, ap);
+    va_end(ap);
+}
+
+void fatalErrorA(const char* msg, bool bExit) {
+    int savedErrno = errno;
+    std::string text = formatWithSpareArgs(msg ? msg : "", {});
+    errno = savedErrno;
+    errorLine("%s", text.c_str());
+    if (bExit) exitSequence();
+}
+
+void fatalErrorA(const char* msg, const char* arg, bool bExit) {
+    int savedErrno = errno;
+    std::string text = formatWithSpareArgs(msg ? msg : "", {strArg(arg)});
+    errno = savedErrno;
+    errorLine("%s", text.c_str());
+    if (bExit) exitSequence();
+}
+
+void fatalErrorA(const char* msg, const wchar_t* arg, bool bExit) {
+    int savedErrno = errno;
+    std::string narg;
+    wcstochar(narg, arg ? arg : L"");
+    std::string text = formatWithSpareArgs(narrowFormatForWideArg(msg ? msg : ""), {strArg(narg.c_str())});
+    errno = savedErrno;
+    errorLine("%s", text.c_str());
+    if (bExit) exitSequence();
+}
+
+void fatalErrorW(const wchar_t* mgs, bool bExit) {
+    int savedErrno = errno;
+    std::string fmt;
+    wcstochar(fmt, mgs ? mgs : L"");
+    std::string text = formatWithSpareArgs(fmt, {});
+    errno = savedErrno;
+    errorLine("%s", text.c_str());
+    if (bExit) exitSequence();
+}
+
+const std::string& getLogQueue() { return logque; }
+
+void resetLoggingForTest() {
+    if (logFILE != nullptr) fclose(logFILE);
+    logFILE = nullptr;
+    logque.clear();
+    debug = true;
+}

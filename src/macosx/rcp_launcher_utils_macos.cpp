@@ -1,0 +1,136 @@
+// Conversions between the launcher's wide strings and the locale's multibyte
+// encoding, and the environment look-ups.
+//
+// The conversions never fail: a byte that is not valid in the locale's
+// encoding becomes U+DC00 + byte on the way in and that byte again on the way
+// out, so a file name or argument in any encoding reaches the system exactly
+// as it arrived.
+#include <unistd.h>
+
+#include <cerrno>
+#include <climits>
+#include <cstdlib>
+#include <cstring>
+#include <cwchar>
+
+#include "rcp_launcher.h"
+
+namespace {
+
+constexpr wchar_t ESCAPE_LOW = 0xDC80;
+constexpr wchar_t ESCAPE_HIGH = 0xDCFF;
+
+std::wstring decodeMultibyte(const char* cs) {
+    std::wstring out;
+    if (cs == nullptr) return out;
+    size_t len = strlen(cs);
+    out.reserve(len);
+    mbstate_t state;
+    memset(&state, 0, sizeof state);
+    size_t i = 0;
+    while (i < len) {
+        wchar_t wc = 0;
+        size_t n = mbrtowc(&wc, cs + i, len - i, &state);
+        if (n == static_cast<size_t>(-1) || n == static_cast<size_t>(-2) || n == 0) {
+            // Invalid or truncated sequence: keep the byte itself.
+            out += static_cast<wchar_t>(0xDC00 + static_cast<unsigned char>(cs[i]));
+            memset(&state, 0, sizeof state);
+            ++i;
+            continue;
+        }
+        out += wc;
+        i += n;
+    }
+    return out;
+}
+
+// Returns false when some character had no multibyte form ('?' written).
+bool encodeMultibyte(const wchar_t* wcs, std::string& out) {
+    out.clear();
+    if (wcs == nullptr) return true;
+    bool ok = true;
+    mbstate_t state;
+    memset(&state, 0, sizeof state);
+    char buf[MB_LEN_MAX];
+    for (const wchar_t* p = wcs; *p != 0; ++p) {
+        if (*p >= ESCAPE_LOW && *p <= ESCAPE_HIGH) {
+            out += static_cast<char>(*p - 0xDC00);
+            continue;
+        }
+        size_t n = wcrtomb(buf, *p, &state);
+        if (n == static_cast<size_t>(-1)) {
+            out += '?';
+            ok = false;
+            memset(&state, 0, sizeof state);
+            continue;
+        }
+        out.append(buf, n);
+    }
+    return ok;
+}
+
+void replaceAll(std::wstring& in, wchar_t from, wchar_t to) {
+    for (size_t pos = in.find(from); pos != std::wstring::npos; pos = in.find(from, pos)) in[pos] = to;
+}
+
+}  // namespace
+
+String mallocString(unsigned long len) {
+    String s = static_cast<String>(malloc((len + 1) * sizeof(wchar_t)));
+    if (s == nullptr) {
+        fatalErrorA("RLNCH0004E: mallocString malloc failed!", true);
+        return nullptr;
+    }
+    s[0] = 0;
+    return s;
+}
+
+String chartowcs(const char* cs) { return copyString(decodeMultibyte(cs).c_str()); }
+
+const wchar_t* chartowstr(const char* cs, std::wstring& wstr) {
+    wstr = decodeMultibyte(cs);
+    return wstr.c_str();
+}
+
+int wstrtocs(std::string& str, const std::wstring& wstr) {
+    bool ok = encodeMultibyte(wstr.c_str(), str);
+    return ok ? static_cast<int>(str.size()) : -1;
+}
+
+void wcstochar(std::string& str, const wchar_t* wcs) { encodeMultibyte(wcs, str); }
+
+void convertBS2S(std::wstring& in) { replaceAll(in, L'\\', L'/'); }
+
+void convertToOsSeparator(std::wstring& in) { convertBS2S(in); }
+
+void convertS2BS(std::wstring& in) { replaceAll(in, L'/', BS_CHAR[0]); }
+
+void open_file(FILE*& inX, const wchar_t* file, const wchar_t* mode) {
+    std::string nfile, nmode;
+    wcstochar(nfile, file);
+    wcstochar(nmode, mode);
+    inX = fopen(nfile.c_str(), nmode.c_str());
+    if (inX != nullptr) fwide(inX, -1);
+}
+
+const wchar_t* getEnv(const wchar_t* var, std::wstring& value) {
+    std::string name;
+    wstrtocs(name, var ? var : L"");
+    const char* v = getenv(name.c_str());
+    if (v != nullptr) return chartowstr(v, value);
+    value.clear();
+    SvcDebugOutW(L"RLNCH0081I:  Environmental variable '%s' is not set\n", var);
+    return nullptr;
+}
+
+bool userIsAdmin(const wchar_t* /*user*/) { return getuid() == 0; }
+
+std::wstring formatWithoutArgs(const std::wstring& fmt) {
+    std::wstring out;
+    out.reserve(fmt.size());
+    for (size_t i = 0; i < fmt.size(); ++i) {
+        if (fmt[i] == L'%' && i + 1 < fmt.size() && fmt[i + 1] == L'%') ++i;
+        out += fmt[i];
+    }
+    return out;
+}
