@@ -1,0 +1,142 @@
+// Where a launch keeps its data: the installation identifier, the workspace
+// and the configuration area for every install configuration, and whether an
+// existing configuration area was written by a different installation.
+// Nothing here creates directories; the startup sequence does that.
+#include <cwchar>
+#include <string>
+#include <vector>
+
+#include "rcp_launcher.h"
+
+namespace {
+
+// Room for the decimal seconds of the new identifier.
+constexpr size_t INSTALL_ID_CHARS = 100;
+
+// A location given by the user or the administrator may end in a separator;
+// exactly one is dropped so "/a/b/" and "/a/b" name the same workspace.
+void removeOneTrailingSeparator(wstring& path) {
+    if (!path.empty() && (path.back() == L'/' || path.back() == L'\\')) path.pop_back();
+}
+
+}  // namespace
+
+String getInstallID(wstring rcp_launcher_properties_file, std::vector<String>& rcpLauncherPropertiesArray) {
+    String installID = findProperty(RCP_INSTALL_ID_PROPERTY, rcpLauncherPropertiesArray);
+    if (installID != nullptr) return installID;
+
+    if (eConfig != userpb) {
+        fatalErrorA("RLNCH0016E: rcp.install.id is required for this configuration!", true);
+        return nullptr;
+    }
+
+    // A package-builder installation names itself on its first launch; the
+    // array keeps its key/value pairing and owns both new strings.
+    String key = copyString(RCP_INSTALL_ID_PROPERTY);
+    String value = newString(INSTALL_ID_CHARS);
+    getTickString(value, INSTALL_ID_CHARS + 1);
+    rcpLauncherPropertiesArray.push_back(key);
+    rcpLauncherPropertiesArray.push_back(value);
+    installID = findProperty(RCP_INSTALL_ID_PROPERTY, rcpLauncherPropertiesArray);
+
+    // Persist it so that every later launch finds the same identifier and so
+    // the same default workspace. No line end is written first: a file whose
+    // last line lacks one gets the entry joined to that line.
+    FILE* fp = nullptr;
+    open_wfile(fp, rcp_launcher_properties_file.c_str(), L"a+");
+    if (fp == nullptr) {
+        fatalErrorA("RLNCH0017E: Could not open %ls to append rcp.install.id!", rcp_launcher_properties_file.c_str(),
+                    true);
+        return installID;
+    }
+    const wstring line = wstring(RCP_INSTALL_ID_PROPERTY) + EQUALS_CHAR + installID + NEWLINE;
+    // The line is formatted as a text without arguments, never handed to
+    // printf as a format.
+    const bool written = fputws(formatWithoutArgs(line).c_str(), fp) >= 0 && fflush(fp) == 0;
+    fclose(fp);
+    if (!written) {
+        fatalErrorA("RLNCH0018E: Error while writing to %ls file.", rcp_launcher_properties_file.c_str(), true);
+    }
+    return installID;
+}
+
+int getWorkspaceLocation(wstring& workspaceLocation, std::vector<String>& rcpInstallPropertiesArray, int argc,
+                         wchar_t** argv, wstring& installDir) {
+    if (eConfig == service) {
+        workspaceLocation = installDir + WORKSPACE_LOC;
+        return 1;
+    }
+    if (eConfig == multiuser_service) {
+        workspaceLocation = installDir + MUSVC_WORKSPACE_LOC;
+        return 1;
+    }
+
+    // "-data" as the last argument has no value and is ignored.
+    const int dataIndex = findOption(DATAARG, argc, argv);
+    if (dataIndex >= 1 && dataIndex + 1 < argc && argv[dataIndex + 1] != nullptr) {
+        workspaceLocation = argv[dataIndex + 1];
+        removeOneTrailingSeparator(workspaceLocation);
+        return 1;
+    }
+
+    String rcpData = findProperty(RCP_DATA_PROPERTY, rcpInstallPropertiesArray);
+    if (rcpData != nullptr) {
+        wstring expanded = rcpData;
+        if (!replaceUserPlaceholders(expanded, rcpInstallPropertiesArray)) {
+            fatalErrorA("RLNCH0099E: rcp.data property is invalid (%ls)", expanded.c_str(), true);
+            return 0;
+        }
+        removeOneTrailingSeparator(expanded);
+        workspaceLocation = expanded;
+        return 1;
+    }
+
+    String installID = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
+    if (installID == nullptr) {
+        fatalErrorA("RLNCH0005E: Couldn't find the rcp.install.id property!", true);
+        return 0;
+    }
+    wstring userName;
+    if (getEnv(USER_IN_ENV, userName) == nullptr) {
+        fatalErrorA("RLNCH0006E: Couldn't find the user name!", true);
+        return 0;
+    }
+    wstring home;
+    getUserHome(home);
+    workspaceLocation = home + USER_WORKSPACE_MIDDLE + installID + L"/" + userName;
+    return 0;
+}
+
+int getConfigurationLocation(wstring& configLocation, std::vector<String>& rcpInstallPropertiesArray, int argc,
+                             wchar_t** argv, wstring& installDir) {
+    // Always computed first, so a bad workspace setting fails here as well.
+    wstring workspace;
+    const int result = getWorkspaceLocation(workspace, rcpInstallPropertiesArray, argc, argv, installDir);
+
+    if (eConfig == service) {
+        configLocation = installDir + CONFIG_LOC;
+        return 1;
+    }
+    if (eConfig == multiuser_service) {
+        configLocation = installDir + MUSVC_CONFIG_LOC;
+        return 1;
+    }
+    configLocation = workspace + CONFIG_SUBDIR;
+    return result;
+}
+
+bool isOldRcpInstallId(const wstring& launcherInstallID, const wstring& configLocation) {
+    wstring propsPath = configLocation + L"/" + INSTALL_PROPS;
+    convertToOsSeparator(propsPath);
+    if (!exists(propsPath.c_str())) return false;
+
+    std::vector<String> props;
+    getProperties(propsPath, props);
+    String stored = findProperty(RCP_INSTALL_ID_PROPERTY, props);
+    const wstring areaInstallID = stored != nullptr ? stored : L"";
+    freeProperties(props);
+
+    // An area that never recorded an identifier is not treated as foreign.
+    if (areaInstallID.empty()) return false;
+    return areaInstallID != launcherInstallID;
+}

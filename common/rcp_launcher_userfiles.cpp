@@ -1,0 +1,246 @@
+// The per-user files of a configuration area, made on the first launch into
+// it: the user's rcpinstall.properties (the installation's copy filtered for
+// this platform, with the values the launcher computed appended), config.ini
+// and the update manager's platform.xml. Existing files are never touched.
+#include <cwchar>
+#include <string>
+#include <vector>
+
+#include "rcp_launcher.h"
+
+namespace {
+
+constexpr const wchar_t* WORK_FILE_SUFFIX = L".new";
+constexpr const wchar_t* FEATURE_LINE = L"<feature>";
+
+// At most 2024 bytes of a line; the trailing "\n" swallows the line end and
+// all white space after it, so blank lines and indentation vanish.
+constexpr const wchar_t* LINE_SCAN_FORMAT = L"%2024[^\n]\n";
+
+// Reads the next line of a template. False at the end of the file, and also
+// when the scan matched nothing: that happens only at a line end the scan
+// cannot pass (a file that begins with an empty line), where going on would
+// never make progress.
+bool readTemplateLine(FILE* in, wstring& line, int& scanResult) {
+    scanResult = readFile(in, LINE_SCAN_FORMAT, line);
+    return scanResult > 0;
+}
+
+// Appends "key=value\n" with the value as the launcher properties hold it.
+// Returns false when the property is absent.
+bool appendPlain(wstring& block, const wchar_t* key, const wchar_t* sourceKey, const std::vector<String>& props) {
+    String value = findProperty(sourceKey, props);
+    if (value == nullptr) return false;
+    block += key;
+    block += EQUALS_CHAR;
+    block += value;
+    block += NEWLINE;
+    return true;
+}
+
+// Appends "key=value\n" for a path: backslashes made "/", then escaped so
+// that the properties reader gives the path back unchanged.
+bool appendPath(wstring& block, const wchar_t* key, const wchar_t* sourceKey, const std::vector<String>& props) {
+    String value = findProperty(sourceKey, props);
+    if (value == nullptr) return false;
+    wstring path = value;
+    convertBS2S(path);
+    block += key;
+    block += EQUALS_CHAR;
+    convWcharTo8859_1_Value(path, block);
+    block += NEWLINE;
+    return true;
+}
+
+void writeCopiedLine(FILE* out, const wstring& line) {
+    if (fputws((line + NEWLINE).c_str(), out) < 0) {
+        SvcDebugOutA(
+            "RLNCH0001E: Error while copying base rcpinstall.properties to user specific rcpinstall.properties file.");
+    }
+}
+
+}  // namespace
+
+wstring createRCPInstallProps(const wstring& workspaceLocation, const wstring& configLocation,
+                              const wstring& baseLocation, const wstring& installDir, std::vector<String> propsArray) {
+    wstring propPath = configLocation + L"/" + INSTALL_PROPS;
+    convertToOsSeparator(propPath);
+    if (exists(propPath.c_str())) return propPath;
+
+    const wstring basePath = getCoreFileLocation(baseLocation, INSTALL_PROPS);
+    if (!copyFile(basePath.c_str(), propPath.c_str())) {
+        fatalErrorA("RLNCH0022E: Unable to copy rcpinstall.properties to the user directory.", true);
+        return propPath;
+    }
+
+    wstring newPropPath = propPath + WORK_FILE_SUFFIX;
+    fixUserRCPInstallProperties(workspaceLocation, propPath, newPropPath, installDir, propsArray);
+
+    // The finished work file replaces the plain copy by one rename, which
+    // swaps the file atomically: at no moment is the per-user file missing
+    // while a finished work file exists, and a crash leaves either the old
+    // or the new content. Deleting the copy first and renaming afterwards
+    // gives the same end state, but with a window in which neither name
+    // holds the finished file. Only when the rename fails is the plain copy
+    // deleted, so that no copy without the computed values survives: the
+    // read that follows then fails and the next launch builds the file
+    // again from the base copy.
+    if (!moveFile(newPropPath.c_str(), propPath.c_str())) deleteFile(propPath.c_str());
+
+    userFirstLaunch = true;
+    return propPath;
+}
+
+int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propPath, wstring& newPropPath,
+                                const wstring& installDir, std::vector<String>& propsArray) {
+    (void)workspaceLocation;
+    (void)installDir;
+    wstring inPath = propPath;
+    convertToOsSeparator(inPath);
+    wstring outPath = newPropPath;
+    convertToOsSeparator(outPath);
+
+    FILE* in = nullptr;
+    FILE* out = nullptr;
+    open_file(in, inPath.c_str(), L"r");
+    open_wfile(out, outPath.c_str(), L"w");
+    if (in == nullptr || out == nullptr) {
+        SvcDebugOutA(
+            "RLNCH0074E: Unable to open user specific rcpinstall.properties and temporary rcpinstall.properties "
+            "files.");
+        if (in != nullptr) fclose(in);
+        if (out != nullptr) fclose(out);
+        return -1;
+    }
+
+    rewind(in);
+    bool bPropertyContinuation = false;         // a kept property continues on the next line
+    bool bInvalidPropertyContinuation = false;  // a dropped property continues on the next line
+    int scan_result = 0;
+    wstring line;
+    while (!feof(in) && readTemplateLine(in, line, scan_result)) {
+        if (bInvalidPropertyContinuation) {
+            bInvalidPropertyContinuation = isContinuationLine(line);
+            bPropertyContinuation = false;
+            continue;
+        }
+        if (bPropertyContinuation) {
+            bPropertyContinuation = isContinuationLine(line);
+            writeCopiedLine(out, line);
+            continue;
+        }
+        if (isComment(line)) {
+            writeCopiedLine(out, line);
+            continue;
+        }
+        bPropertyContinuation = isContinuationLine(line);
+        if (processFilterKey(line)) {
+            // Another platform's line: its continuation lines go with it.
+            if (bPropertyContinuation) {
+                bInvalidPropertyContinuation = true;
+                bPropertyContinuation = false;
+            }
+            continue;
+        }
+        writeCopiedLine(out, line);
+    }
+    fclose(in);
+
+    // The values this launch computed, in a fixed order. The reader takes
+    // the first occurrence of a key, so a key already in the base file keeps
+    // the base file's value.
+    wstring block;
+    int missing = 0;
+    if (!appendPlain(block, RCP_INSTALL_ID_PROPERTY, RCP_INSTALL_ID_PROPERTY, propsArray)) missing++;
+    appendPath(block, RCP_DATA_PROPERTY, RCP_DATA_PROPERTY, propsArray);
+    if (!appendPath(block, VM, JVM_LOCATION, propsArray)) missing++;
+    if (!appendPath(block, RCP_BASE_LOC_PROPERTY, RCP_BASE_LOC_PROPERTY, propsArray)) missing++;
+    if (!appendPlain(block, CONFIGURATION_PROPERTY, CONFIGURATION_PROPERTY, propsArray)) missing++;
+    appendPlain(block, LOCALE_PROPERTY, LOCALE_PROPERTY, propsArray);
+    appendPlain(block, BIDI_PROPERTY, BIDI_PROPERTY, propsArray);
+
+    if (missing > 0) {
+        // The plain copy stays in place (and the work file beside it).
+        fclose(out);
+        fatalErrorA("RLNCH0008E: Unable to calculate necessary values for user specific rcpinstall.properties file.",
+                    true);
+        return -1;
+    }
+
+    // The block is expanded as a text without arguments ("%%" gives "%"),
+    // never handed to printf as a format.
+    const bool appended = fputws(formatWithoutArgs(block).c_str(), out) >= 0 && fflush(out) == 0;
+    if (!appended) SvcDebugOutA("RLNCH0015E: Unable to append values to user specific rcpinstall.properties file.");
+    fclose(out);
+    return 0;
+}
+
+void createConfigIni(const wstring& configLocation, const wstring& baseLocation) {
+    wstring target = configLocation + L"/" + CONFIG_INI;
+    convertToOsSeparator(target);
+    if (exists(target.c_str())) return;
+
+    const wstring basePath = getCoreFileLocation(baseLocation, CONFIG_INI);
+    if (!copyFile(basePath.c_str(), target.c_str())) {
+        fatalErrorA("RLNCH0009E: Unable to copy config.ini to the user directory.", true);
+        return;
+    }
+    userFirstLaunch = true;
+}
+
+int createPlatformXML(const wstring& configLocation, const wstring& baseLocation,
+                      std::vector<String> rcpLauncherPropertiesArray) {
+    // A package-builder installation manages its own update sites.
+    if (eConfig == userpb) return 0;
+
+    wstring updateDir = configLocation + L"/" + UPDATE_DIR;
+    convertToOsSeparator(updateDir);
+    if (!isDirectory(updateDir.c_str())) {
+        userFirstLaunch = true;
+        if (!mkdirs(updateDir.c_str())) {
+            fatalErrorA("RLNCH0010E: Unable to create %ls directory.", updateDir.c_str(), true);
+            return -1;
+        }
+    }
+
+    wstring target = updateDir + L"/" + PLATFORM_XML;
+    convertToOsSeparator(target);
+    if (exists(target.c_str())) return 0;
+
+    // A managed update policy means the platform writes its own file.
+    String policy = findProperty(UPDATE_POLICY_MGD, rcpLauncherPropertiesArray);
+    if (policy != nullptr && wcscmp(policy, L"false") == 0) return 0;
+
+    const wstring basePath = getCoreFileLocation(baseLocation, PLATFORM_XML);
+    FILE* in = nullptr;
+    open_file(in, basePath.c_str(), L"r");
+    if (in == nullptr) {
+        SvcDebugOutW(L"RLNCH0104E: Unable to open platform.xml.\"%s\"", basePath.c_str());
+        return -1;
+    }
+    FILE* out = nullptr;
+    open_wfile(out, target.c_str(), L"w");
+    if (out == nullptr) {
+        SvcDebugOutW(L"RLNCH0105E: Unable to open platform.xml for writing.\"%s\"", target.c_str());
+        fclose(in);
+        return -1;
+    }
+
+    rewind(in);
+    int scan_result = 0;
+    wstring line;
+    while (!feof(in) && readTemplateLine(in, line, scan_result)) {
+        // The JVM's feature is filled in by the platform at run time.
+        if (line.find(JVM_FEATUREID_REPLACE) != wstring::npos) line = FEATURE_LINE;
+        if (line.find(JVM_PARENT_FEATUREID_REPLACE) != wstring::npos) line = FEATURE_LINE;
+        line += NEWLINE;
+        if (fputws(line.c_str(), out) < 0) {
+            SvcDebugOutA("RLNCH0103E: Error while copying platform.xml to user specific platform.xml file.");
+            break;
+        }
+    }
+    fclose(in);
+    fclose(out);
+    userFirstLaunch = true;
+    return 0;
+}
