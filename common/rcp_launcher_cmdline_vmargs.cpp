@@ -1,0 +1,156 @@
+// Command-line builders for what the JVM itself reads: the "-vmargs"
+// separator, the user's own VM arguments, the fixed and configured system
+// properties, the -X options and the boot class path additions.
+#include <cstdlib>
+#include <cwchar>
+#include <string>
+#include <vector>
+
+#include "rcp_launcher.h"
+
+namespace {
+
+// Walks a findProperties result (key, value, key, value, ..., "") and releases
+// the array, which only borrows the strings, at the end.
+template <typename Fn>
+void forEachProperty(const wchar_t* prefix, const std::vector<String>& props, Fn fn) {
+    String* found = findProperties(prefix, props);
+    if (found == nullptr) return;
+    for (size_t i = 0; found[i] != nullptr && found[i][0] != L'\0'; i += 2) {
+        const wchar_t* value = found[i + 1] != nullptr ? found[i + 1] : L"";
+        if (!fn(found[i], value)) break;
+    }
+    free(found);
+}
+
+const wchar_t* configurationName() {
+    switch (eConfig) {
+        case service:
+            return SERVICE_CFG;
+        case lockdown:
+            return LOCKDOWN_CFG;
+        case user:
+            return USER_CFG;
+        case serial_multiuser:
+            return SERIAL_USER_CFG;
+        case multiuser:
+        case multiuser_service:
+            return MULTIUSER_CFG;
+        case userpb:
+            return USERPB_CFG;
+        case undefined:
+        default:
+            return nullptr;
+    }
+}
+
+}  // namespace
+
+void setArgProperty(wstring& prop, const wchar_t* key, const wchar_t* value) {
+    prop = key != nullptr ? key : L"";
+    prop += EQUALS_CHAR;
+    prop += value != nullptr ? value : L"";
+}
+
+void addVmargsToCommandLine(const wstring& workspaceLocation, std::vector<String>& rcpInstallPropertiesArray,
+                            int argc, wchar_t** argv) {
+    // The Eclipse executable hands everything after "-vmargs" to the JVM; a
+    // directly started JVM needs no separator.
+    if (eConfig != service && eConfig != multiuser_service) addArgToCommandLine(VMARGS);
+
+    // The user's own VM arguments come before every configured one.
+    int vmargsIdx = findOption(VMARGS, argc, argv);
+    if (vmargsIdx != -1) {
+        for (int i = vmargsIdx + 1; i < argc; i++) {
+            if (argv[i] != nullptr) addArgToCommandLine(argv[i]);
+        }
+    }
+
+    // Without a console the JVM gets its console fix; a restart never keeps
+    // the console, so it gets the fix as well.
+    int consoleIdx = findOption(CONSOLEARG, argc, argv);
+    int restartIdx = findOption(RESTARTARG, argc, argv);
+    if (restartIdx != -1 || consoleIdx == -1) {
+        forEachProperty(VMFIXARG_PROPERTY, rcpInstallPropertiesArray, [&](const wchar_t*, const wchar_t* value) {
+            wstring vmfix(value);
+            size_t pos = vmfix.find(WORKSPACELOCATION_REPLACE);
+            if (pos != wstring::npos) vmfix.replace(pos, wcslen(WORKSPACELOCATION_REPLACE), workspaceLocation);
+            convertToOsSeparator(vmfix);
+            addArgToCommandLine(vmfix);
+            return false;  // the first entry only
+        });
+    }
+
+    // In file order: the text after "vmarg." is a name, not a sort key.
+    forEachProperty(VMARG_PROPERTY, rcpInstallPropertiesArray, [](const wchar_t*, const wchar_t* value) {
+        if (value[0] != L'\0') addArgToCommandLine(value);
+        return true;
+    });
+}
+
+void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
+                           std::vector<String>& rcpLauncherPropertiesArray, int argc, wchar_t** argv,
+                           wstring& installDir) {
+    wstring commandArg;
+
+    setArgProperty(commandArg, D_RCP_HOME, installDir.c_str());
+    addArgToCommandLine(commandArg);
+
+    wstring workspace;
+    getWorkspaceLocation(workspace, rcpInstallPropertiesArray, argc, argv, installDir);
+    setArgProperty(commandArg, D_RCP_DATA, workspace.c_str());
+    addArgToCommandLine(commandArg);
+
+    String splashPath = findProperty(OSGI_SPLASH_PATH, rcpLauncherPropertiesArray);
+    if (splashPath != nullptr) {
+        setArgProperty(commandArg, (wstring(L"-D") + OSGI_SPLASH_PATH).c_str(), splashPath);
+        addArgToCommandLine(commandArg);
+    }
+
+    String IDString = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
+    if (IDString == nullptr) {
+        fatalErrorA("RLNCH0005E: Couldn't find the rcp.install.id property!", true);
+        return;
+    }
+    setArgProperty(commandArg, D_RCP_INSTALL_ID_PROP, IDString);
+    addArgToCommandLine(commandArg);
+
+    const wchar_t* configName = configurationName();
+    if (configName == nullptr) {
+        fatalErrorA("RLNCH0025E: The platform rcp.install.id must be provided for this configuration!", true);
+        return;
+    }
+    setArgProperty(commandArg, D_CONFIG, configName);
+    addArgToCommandLine(commandArg);
+
+    // Every "-D" entry, even with an empty value (the JVM then sees "key=").
+    forEachProperty(L"-D", rcpInstallPropertiesArray, [&](const wchar_t* key, const wchar_t* value) {
+        setArgProperty(commandArg, key, value);
+        addArgToCommandLine(commandArg);
+        SvcDebugOutW(L"RLNCH0075I: commandArg  = \"%s\"", commandArg.c_str());
+        return true;
+    });
+
+    wstring installArea = installDir + L"/eclipse";
+    convertToOsSeparator(installArea);
+    if (!exists(installArea.c_str())) {
+        installArea = installDir + L"/rcp/eclipse";
+        convertToOsSeparator(installArea);
+    }
+    setArgProperty(commandArg, D_OSGI_INSTALL_AREA, installArea.c_str());
+    addArgToCommandLine(commandArg);
+}
+
+void addXargsToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
+    // The reader splits "-Xmx=512m" at the "=" and keeps it in the value, so
+    // joining key and value gives the option text back.
+    forEachProperty(L"-X", rcpInstallPropertiesArray, [](const wchar_t* key, const wchar_t* value) {
+        addArgToCommandLine(wstring(key) + value);
+        return true;
+    });
+
+    String prepend = findProperty(XBOOTCLASSPATH_PREPEND, rcpInstallPropertiesArray);
+    if (prepend != nullptr) addArgToCommandLine(wstring(XBOOTCLASSPATH_P) + prepend);
+    String append = findProperty(XBOOTCLASSPATH_APPEND, rcpInstallPropertiesArray);
+    if (append != nullptr) addArgToCommandLine(wstring(XBOOTCLASSPATH_A) + append);
+}

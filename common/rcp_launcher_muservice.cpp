@@ -1,0 +1,159 @@
+// The multi-user service's own area inside the installation, and the
+// assembly of the child's command line in the order that the configuration
+// (or a provisioning launch) requires.
+#include <cwchar>
+#include <string>
+#include <vector>
+
+#include "rcp_launcher.h"
+
+namespace {
+
+wstring baseLocationFromLauncherProps(const std::vector<String>& rcpLauncherPropertiesArray,
+                                      const wstring& installDir) {
+    String baseProp = findProperty(RCP_BASE_LOC_PROPERTY, rcpLauncherPropertiesArray);
+    if (baseProp == nullptr) {
+        fatalErrorA("RLNCH0011E: Unable to determine RCP Base Plugin location. If the problem persists, reinstall.",
+                    true);
+        return wstring();
+    }
+    wstring baseLocation(baseProp);
+    size_t pos = baseLocation.find(RCPHOME_REPLACE);
+    if (pos != wstring::npos) baseLocation.replace(pos, wcslen(RCPHOME_REPLACE), installDir);
+    return baseLocation;
+}
+
+void makeServiceDirectory(const wstring& dir) {
+    if (isDirectory(dir.c_str())) return;
+    if (!mkdirs(dir.c_str()) && !isDirectory(dir.c_str()))
+        fatalErrorA("RLNCH0010E: Unable to create %ls directory.", dir.c_str(), true);
+}
+
+// A new provisioning level invalidates the JVM's shared class cache. A failed
+// clean-up is reported but does not stop the launch.
+void cleanSharedClasses(std::vector<String>& rcpInstallPropertiesArray,
+                        std::vector<String>& rcpLauncherPropertiesArray) {
+    if (!isNewProvisioningLevel(findProperty(PROV_MANIFEST_VERSION, rcpInstallPropertiesArray),
+                                findProperty(PROV_MANIFEST_VERSION, rcpLauncherPropertiesArray)))
+        return;
+    String sharedClasses = findProperty(SHARECLASSES_PROPERTY, rcpInstallPropertiesArray);
+    if (sharedClasses == nullptr || sharedClasses[0] == L'\0') return;
+    wstring errlist;
+    if (!removeDirectoryContents(wstring(sharedClasses), errlist)) {
+        fatalErrorA("\nRLNCH0086E begin: Error removing shared classes directory\n%ls\n", errlist.c_str(), false);
+        fatalErrorA(
+            "RLNCH0087E end: Unable to remove all files in the shared classes directory. Please correct the "
+            "problems listed above",
+            false);
+    }
+}
+
+}  // namespace
+
+void createMUServiceWkspc(wstring& workspaceLocation, const wstring& installDir,
+                          std::vector<String>& rcpInstallPropertiesArray,
+                          std::vector<String> rcpLauncherPropertiesArray, int argc, wchar_t** argv) {
+    wstring userName;
+    if (eConfig == multiuser_service) {
+        userName = MUSERVICE_USER;
+    } else if (getEnv(USER_IN_ENV, userName) == nullptr) {
+        fatalErrorA("RLNCH0006E: Couldn't find the user name!", true);
+        return;
+    }
+    SvcDebugOutW(L"RLNCH0043I: UserName: %s", userName.c_str());
+
+    // Only the superuser or the service itself may write into the installation.
+    if (!userIsAdmin(userName.c_str()) && eConfig != multiuser_service) return;
+
+    wstring baseLocation = baseLocationFromLauncherProps(rcpLauncherPropertiesArray, installDir);
+    workspaceLocation = installDir + MUSVC_WORKSPACE_LOC;
+    wstring configLocation = installDir + MUSVC_CONFIG_LOC;
+    makeServiceDirectory(workspaceLocation);
+    makeServiceDirectory(configLocation);
+
+    createConfigIni(configLocation, baseLocation);
+    wstring propsFile =
+        createRCPInstallProps(workspaceLocation, configLocation, baseLocation, installDir, rcpLauncherPropertiesArray);
+    getProperties(propsFile, rcpInstallPropertiesArray);
+
+    if (!isVmOverride(argc, argv)) {
+        wstring jvmPropLocation;
+        if (getJvmPropertyLocation(rcpInstallPropertiesArray, installDir, jvmPropLocation))
+            getProperties(jvmPropLocation, rcpInstallPropertiesArray);
+    }
+
+    createPlatformXML(configLocation, baseLocation, rcpLauncherPropertiesArray);
+}
+
+void getUserCmdString(const wstring& workspaceLocation, int argc, wchar_t** argv, wstring installDir,
+                      std::vector<String>& rcpInstallPropertiesArray, std::vector<String>& rcpLauncherPropertiesArray,
+                      bool provisioning, bool bRelaunch) {
+    replacePlaceholdersInRcpInstallProp(workspaceLocation, installDir, rcpInstallPropertiesArray);
+    std::vector<wchar_t*> scratch(argc > 0 ? static_cast<size_t>(argc) : 0, nullptr);
+    if (argc > 0) replacePlaceholdersInArgv(workspaceLocation, installDir, argv, scratch.data(), argc);
+
+    cleanSharedClasses(rcpInstallPropertiesArray, rcpLauncherPropertiesArray);
+
+    if (provisioning) {
+        addBaseEclipseToCommandLine(rcpInstallPropertiesArray);
+        addMainOptionsToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv, installDir);
+        // Without an application to run, a provisioning child would just start
+        // the platform's default application, so the option is left out.
+        String provApp = findProperty(PROV_APP_PROPERTY, rcpInstallPropertiesArray);
+        if (provApp != nullptr) {
+            addArgToCommandLine(APPARG);
+            addArgToCommandLine(provApp);
+        }
+        if (bRelaunch) addArgToCommandLine(USERPROVLAUNCHARG);
+        addVmToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv);
+        addStartupToCommandLine(rcpInstallPropertiesArray, argc, argv);
+        addVmargsToCommandLine(workspaceLocation, rcpInstallPropertiesArray, argc, argv);
+        addDashDToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv, installDir);
+        addXargsToCommandLine(rcpInstallPropertiesArray);
+        addClasspathToCommandLine(rcpInstallPropertiesArray);
+    } else if (eConfig == service || eConfig == multiuser_service) {
+        addVmToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv);
+        addVmargsToCommandLine(workspaceLocation, rcpInstallPropertiesArray, argc, argv);
+        addDashDToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv, installDir);
+        addXargsToCommandLine(rcpInstallPropertiesArray);
+        addClasspathToCommandLine(rcpInstallPropertiesArray);
+        addMainClassToCommandLine();
+        addMainOptionsToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv, installDir);
+    } else {
+        addBaseEclipseToCommandLine(rcpInstallPropertiesArray);
+        addMainOptionsToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv, installDir);
+        addVmToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv);
+        addUseDaemonToCommandLine();
+        addStartupToCommandLine(rcpInstallPropertiesArray, argc, argv);
+        addVmargsToCommandLine(workspaceLocation, rcpInstallPropertiesArray, argc, argv);
+        addDashDToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv, installDir);
+        addXargsToCommandLine(rcpInstallPropertiesArray);
+        addClasspathToCommandLine(rcpInstallPropertiesArray);
+    }
+    addEnvSetToCommandLine(rcpInstallPropertiesArray);
+    addLibpathToCommandLine(rcpInstallPropertiesArray);
+    addLdPreloadToCommandLine(rcpInstallPropertiesArray);
+    addEnvJavaHighZipfds(rcpInstallPropertiesArray);
+}
+
+void startupMUService(int argc, wchar_t** argv) {
+    wstring serviceDir;
+    wstring installDir;
+    getServiceInstallDir(serviceDir, installDir, argc, argv);
+
+    wstring launcherPropsFile = serviceDir + RCP_LAUNCHER_PROPERTIES_FILE;
+    std::vector<String> rcpLauncherPropertiesArray;
+    std::vector<String> rcpInstallPropertiesArray;
+    getProperties(launcherPropsFile, rcpLauncherPropertiesArray);
+    SetInstallConfiguration(rcpLauncherPropertiesArray, true);
+    getInstallID(launcherPropsFile, rcpLauncherPropertiesArray);
+
+    wstring workspaceLocation;
+    createMUServiceWkspc(workspaceLocation, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc,
+                         argv);
+    getUserCmdString(workspaceLocation, argc, argv, installDir, rcpInstallPropertiesArray,
+                     rcpLauncherPropertiesArray, false, false);
+
+    freeProperties(rcpInstallPropertiesArray);
+    freeProperties(rcpLauncherPropertiesArray);
+}

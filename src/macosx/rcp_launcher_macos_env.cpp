@@ -1,0 +1,201 @@
+// The child's environment. The child inherits the launcher's own environment,
+// so these functions change the launcher's environment just before the fork:
+// "env.set" variables, the library path, the preloaded library (through a
+// space-free link under /tmp when its path has blanks) and the JVM's zip
+// descriptor limit.
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdlib>
+#include <cstring>
+#include <cwchar>
+#include <string>
+#include <vector>
+
+#include "rcp_launcher.h"
+
+namespace {
+
+// Characters of "env.set." dropped from a key to get the variable's name.
+constexpr size_t ENV_SET_NAME_OFFSET = 8;
+
+// The target of a symbolic link, or false when it cannot be read. Unlike
+// readsymln this never ends the process: the link may belong to someone else.
+bool readLinkTarget(const std::string& path, std::string& target) {
+    std::vector<char> buf(1024);
+    for (;;) {
+        ssize_t n = readlink(path.c_str(), buf.data(), buf.size());
+        if (n < 0) return false;
+        if (static_cast<size_t>(n) < buf.size()) {
+            target.assign(buf.data(), static_cast<size_t>(n));
+            return true;
+        }
+        if (buf.size() >= 65536) return false;
+        buf.resize(buf.size() * 2);
+    }
+}
+
+// True when linkPath is a symbolic link that this user owns and that points to
+// target. Only such a link may be handed to the dynamic loader: a link or a
+// file planted in /tmp by another user could be swapped for anything.
+bool isOwnLinkTo(const std::string& linkPath, const std::string& target) {
+    struct stat st;
+    if (lstat(linkPath.c_str(), &st) != 0) return false;
+    if (!S_ISLNK(st.st_mode) || st.st_uid != geteuid()) return false;
+    std::string current;
+    return readLinkTarget(linkPath, current) && current == target;
+}
+
+void logPreloadVariable() {
+    const char* value = getenv(LD_PRELOAD_ENV_VAR_A);
+    SvcDebugOutA("setPreload():getenv LD_PRELOAD=%s", value != nullptr ? value : "(null)");
+}
+
+}  // namespace
+
+bool setEnv(const wchar_t* key, const wchar_t* var, bool overwrite) {
+    if (key == nullptr || var == nullptr) return true;
+    std::string keyA;
+    std::string varA;
+    wstrtocs(keyA, key);
+    wstrtocs(varA, var);
+    return setenv(keyA.c_str(), varA.c_str(), overwrite ? 1 : 0) != 0;
+}
+
+bool unsetEnv(const wchar_t* key) {
+    if (key == nullptr) return true;
+    std::string keyA;
+    wstrtocs(keyA, key);
+    unsetenv(keyA.c_str());
+    return true;
+}
+
+void addEnvSetToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
+    String* found = findProperties(ENV_SET_PREFIX, rcpInstallPropertiesArray);
+    if (found == nullptr) return;
+    for (size_t i = 0; found[i] != nullptr && found[i][0] != L'\0'; i += 2) {
+        // The name is whatever follows the first 8 characters ("env.set."),
+        // counted, not searched: "env.setNAME" sets "AME". The bare key
+        // "env.set" has no name at all.
+        if (wcslen(found[i]) < ENV_SET_NAME_OFFSET) continue;
+        setEnv(found[i] + ENV_SET_NAME_OFFSET, found[i + 1] != nullptr ? found[i + 1] : L"", true);
+    }
+    free(found);
+}
+
+void addLibpathToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
+    // Empty pieces are left out: an empty element of the library path means
+    // the current directory, which the child must not search by accident.
+    String append = findProperty(LIBRARY_PATH_APPEND, rcpInstallPropertiesArray);
+    String prepend = findProperty(LIBRARY_PATH_PREPEND, rcpInstallPropertiesArray);
+    wstring current;
+    const wchar_t* inherited = getEnv(LIBRARY_PATH_ENV_VAR, current);
+
+    wstring libpath;
+    bool needSep = false;
+    bool bModified = false;
+    if (prepend != nullptr && prepend[0] != L'\0') {
+        libpath += prepend;
+        needSep = true;
+        bModified = true;
+    }
+    if (inherited != nullptr && inherited[0] != L'\0') {
+        if (needSep) libpath += PATH_SEPARATOR;
+        libpath += inherited;
+        needSep = true;
+    }
+    if (append != nullptr && append[0] != L'\0') {
+        if (needSep) libpath += PATH_SEPARATOR;
+        libpath += append;
+        bModified = true;
+    }
+    if (bModified) setEnv(LIBRARY_PATH_ENV_VAR, libpath.c_str(), true);
+}
+
+void addLdPreloadToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
+    String ldPreload = findProperty(LD_PRELOAD, rcpInstallPropertiesArray);
+    if (ldPreload == nullptr) return;
+    String IDString = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
+    if (IDString == nullptr) {
+        fatalErrorA("RLNCH0005E: Couldn't find the rcp.install.id property!", true);
+        return;
+    }
+    setPreload(ldPreload, IDString);
+}
+
+void setPreload(const wchar_t* ldPreload, const wchar_t* IDString) {
+    if (ldPreload == nullptr) return;
+    std::string ldPreloadA;
+    wstrtocs(ldPreloadA, ldPreload);
+
+    if (wcschr(ldPreload, L' ') == nullptr) {
+        setEnv(LD_PRELOAD_ENV_VAR, ldPreload, true);
+        SvcDebugOutA("setPreload():setting LD_PRELOAD=%s", ldPreloadA.c_str());
+        return;
+    }
+
+    // The preload variable is split at blanks, so a path with blanks is
+    // reached through a link of our own under /tmp.
+    std::string IDStringA;
+    wstrtocs(IDStringA, IDString != nullptr ? IDString : L"");
+    SvcDebugOutA("setPreload():found property: library.preload=%s", ldPreloadA.c_str());
+    if (existsA(ldPreloadA.c_str()) != 1) {
+        logPreloadVariable();
+        return;
+    }
+
+    size_t filenamePos = ldPreloadA.rfind('/');
+    if (filenamePos == std::string::npos) {
+        fatalErrorA("RLNCH0189E: Couldn't find filename for library.preload property", true);
+        return;
+    }
+    std::string preloadName = ldPreloadA.substr(filenamePos + 1);
+    SvcDebugOutA("setPreload():library name = %s", preloadName.c_str());
+
+    const char* userName = getenv(USER_IN_ENV_STRINGA);
+    if (userName == nullptr) {
+        fatalErrorA("RLNCH0006E: Couldn't find the user name!", true);
+        return;
+    }
+
+    std::string linkPath = std::string(TEMPDIR_STRINGA) + "/" + TEMPPREFIX_STRINGA + DOT_CHARA + userName + DOT_CHARA +
+                           IDStringA + DOT_CHARA + preloadName;
+    SvcDebugOutA("setPreload():linkPath=%s", linkPath.c_str());
+
+    // Decide on what is really there (lstat, no link followed). Only our own
+    // symbolic link is ever removed; anything else is left alone.
+    struct stat st;
+    if (lstat(linkPath.c_str(), &st) == 0) {
+        SvcDebugOutA("setPreload(): link path already exists.");
+        std::string target;
+        if (S_ISLNK(st.st_mode) && readLinkTarget(linkPath, target)) {
+            SvcDebugOutA("setPreload(): existing link is to: %s", target.c_str());
+            if (target != ldPreloadA && st.st_uid == geteuid()) {
+                SvcDebugOutA("setPreload(): removing existing link ...");
+                unlink(linkPath.c_str());
+            }
+        }
+    }
+
+    if (lstat(linkPath.c_str(), &st) != 0 && errno == ENOENT) {
+        SvcDebugOutA("setPreload(): creating new link ...");
+        // symlink() never writes through an existing entry: if someone got
+        // there first it fails, and the check below refuses the path.
+        symlink(ldPreloadA.c_str(), linkPath.c_str());
+        SvcDebugOutA("setPreload(): symlink() result = %d", 0);
+    }
+
+    if (isOwnLinkTo(linkPath, ldPreloadA)) {
+        setenv(LD_PRELOAD_ENV_VAR_A, linkPath.c_str(), 1);
+        SvcDebugOutA("setPreload():setting LD_PRELOAD=%s", linkPath.c_str());
+    } else {
+        SvcDebugOutA("setPreload(): link path is not our link to the library; LD_PRELOAD not set.");
+    }
+    logPreloadVariable();
+}
+
+void addEnvJavaHighZipfds(std::vector<String>& rcpInstallPropertiesArray) {
+    String value = findProperty(ENV_JAVA_HIGH_ZIPFDS, rcpInstallPropertiesArray);
+    setEnv(ENV_JAVA_HIGH_ZIPFDS_ENV_VAR, value != nullptr ? value : JAVA_HIGH_ZIPFDS_DEFAULT, true);
+}
