@@ -1,54 +1,106 @@
 /*
- * Stand-in for the platform in the launcher's tests. It records what it was
- * started with and then behaves as told by its environment:
- *   RCP_STUB_RECORD  file to write; when it exists already, RECORD.1, RECORD.2,
- *                    ... are tried in turn so that several children of one
- *                    test can be told apart.
- *   RCP_STUB_SLEEP   seconds to stay alive after writing the record.
+ * Stand-in for the program the launcher starts (the Eclipse executable or the
+ * JVM). It records what it was given and then behaves as told:
+ *
+ *   RCP_STUB_RECORD  path of the record file. When that file already exists,
+ *                    the record goes to PATH.1, PATH.2, ... (the first free
+ *                    one), so several children of one test can be told apart
+ *                    in the order they started. The record is written to a
+ *                    private file first and then linked into place, so a
+ *                    record that can be seen is complete. Unset: no record.
+ *   RCP_STUB_SLEEP   seconds to sleep after writing the record (default 0).
  *   RCP_STUB_EXIT    exit status (default 0).
- * Record format, every item NUL-terminated so that any text survives:
- *   "ARGV" <argc in decimal> <arg0> ... <argN-1> "ENV" <count> <NAME=value> ...
- * The record is written to a temporary name and renamed into place, so a
- * reader never sees half of it.
+ *
+ * Record format: NUL-terminated fields, so that values holding blanks or
+ * newlines survive:
+ *   "PID"  <process id in decimal>
+ *   "ARGV" <count n> <arg 0> ... <arg n-1>
+ *   "ENV"  <count m> <entry 0> ... <entry m-1>     (entries are NAME=value)
+ *   "END"
  */
+#include <errno.h>
 #include <fcntl.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 #include <unistd.h>
 
-extern char** environ;
+#define MAX_RECORDS 1000
 
-static void put(FILE* f, const char* s) { fwrite(s, 1, strlen(s) + 1, f); }
+static int write_all(int fd, const char* data, size_t len) {
+    while (len > 0) {
+        ssize_t n = write(fd, data, len);
+        if (n < 0) {
+            if (errno == EINTR) continue;
+            return -1;
+        }
+        data += n;
+        len -= (size_t)n;
+    }
+    return 0;
+}
 
-int main(int argc, char** argv) {
-    const char* record = getenv("RCP_STUB_RECORD");
-    if (record != NULL && *record != '\0') {
-        char path[4096];
-        char tmp[4200];
-        int n = 0;
-        snprintf(path, sizeof path, "%s", record);
-        while (access(path, F_OK) == 0 && n < 1000) snprintf(path, sizeof path, "%s.%d", record, ++n);
-        snprintf(tmp, sizeof tmp, "%s.tmp.%ld", path, (long)getpid());
-        FILE* f = fopen(tmp, "wb");
-        if (f != NULL) {
-            char num[32];
-            int envCount = 0;
-            put(f, "ARGV");
-            snprintf(num, sizeof num, "%d", argc);
-            put(f, num);
-            for (int i = 0; i < argc; ++i) put(f, argv[i]);
-            for (char** e = environ; *e != NULL; ++e) ++envCount;
-            put(f, "ENV");
-            snprintf(num, sizeof num, "%d", envCount);
-            put(f, num);
-            for (char** e = environ; *e != NULL; ++e) put(f, *e);
-            fclose(f);
-            rename(tmp, path);
+static int write_field(int fd, const char* text) { return write_all(fd, text, strlen(text) + 1); }
+
+static int write_number(int fd, long value) {
+    char buf[32];
+    snprintf(buf, sizeof buf, "%ld", value);
+    return write_field(fd, buf);
+}
+
+static int write_list(int fd, const char* tag, char** list) {
+    long count = 0;
+    while (list && list[count]) count++;
+    if (write_field(fd, tag) || write_number(fd, count)) return -1;
+    for (long i = 0; i < count; i++)
+        if (write_field(fd, list[i])) return -1;
+    return 0;
+}
+
+static int write_record(const char* path, char** argv, char** envp) {
+    size_t len = strlen(path);
+    char* tmp = malloc(len + 64);
+    char* name = malloc(len + 16);
+    int rc = -1;
+    if (!tmp || !name) goto out;
+
+    snprintf(tmp, len + 64, "%s.tmp.%ld", path, (long)getpid());
+    int fd = open(tmp, O_WRONLY | O_CREAT | O_TRUNC, 0644);
+    if (fd < 0) goto out;
+    int bad = write_field(fd, "PID") || write_number(fd, (long)getpid()) || write_list(fd, "ARGV", argv) ||
+              write_list(fd, "ENV", envp) || write_field(fd, "END");
+    if (close(fd) != 0) bad = 1;
+    if (!bad) {
+        for (int i = 0; i < MAX_RECORDS; i++) {
+            if (i == 0)
+                snprintf(name, len + 16, "%s", path);
+            else
+                snprintf(name, len + 16, "%s.%d", path, i);
+            if (link(tmp, name) == 0) {
+                rc = 0;
+                break;
+            }
+            if (errno != EEXIST) break;
         }
     }
-    const char* sleepFor = getenv("RCP_STUB_SLEEP");
-    if (sleepFor != NULL) sleep((unsigned)atoi(sleepFor));
+    unlink(tmp);
+out:
+    free(tmp);
+    free(name);
+    return rc;
+}
+
+int main(int argc, char** argv, char** envp) {
+    (void)argc;
+    const char* record = getenv("RCP_STUB_RECORD");
+    if (record && *record) write_record(record, argv, envp);
+
+    const char* nap = getenv("RCP_STUB_SLEEP");
+    if (nap && *nap) {
+        unsigned seconds = (unsigned)strtoul(nap, NULL, 10);
+        while (seconds > 0) seconds = sleep(seconds);
+    }
+
     const char* status = getenv("RCP_STUB_EXIT");
-    return status != NULL ? atoi(status) : 0;
+    return status && *status ? atoi(status) : 0;
 }
