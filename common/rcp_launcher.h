@@ -104,7 +104,7 @@ void trimString(wstring& s);
 bool isComment(const wstring& line);
 bool isContinuationLine(const wstring& line);
 bool processFilterKey(wstring& line);  // true: the line belongs to another platform
-// Frees every non-empty entry and empties the array.
+// Frees every entry (each is its own allocation) and empties the array.
 void freeProperties(std::vector<String>& propArray);
 
 // ===================== Properties writer (rcp_launcher_properties) ===========

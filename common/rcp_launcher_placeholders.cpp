@@ -1,0 +1,220 @@
+// Expansion of "${...}" placeholders in property values and arguments.
+//
+// Standard placeholders stand for the installation directory and the
+// workspace; user placeholders "${env.NAME}" and "${prop.KEY}" for an
+// environment variable and another property. User placeholders are expanded
+// from the right, so a placeholder produced by an inserted value is expanded
+// next, before anything to its left.
+#include <cwchar>
+
+#include "rcp_launcher.h"
+
+namespace {
+
+const wchar_t* const PH_OPEN = L"${";
+const wchar_t PH_CLOSE = L'}';
+const wchar_t* const ENV_PREFIX = L"env.";    // 4 characters
+const wchar_t* const PROP_PREFIX = L"prop.";  // 5 characters
+
+// A placeholder that keeps coming back at the same or a later position is a
+// value that contains itself.
+const int MAX_PLACEHOLDER_CYCLES = 10;
+
+// Values that expand each other can double the text at every step; past
+// these bounds the expansion is treated like a self-referencing value.
+const size_t MAX_EXPANDED_LENGTH = 1u << 18;
+const size_t MAX_EXPANSION_STEPS = 10000;
+
+// The debug line is cut at 4096 bytes anyway; no need to copy more of a long
+// text into it.
+const size_t LOG_TEXT_LIMIT = 4096;
+
+// Shared target of the argument marks that say "not changed"; never freed.
+wchar_t unchangedArg[1] = {0};
+
+// Replaces every occurrence of placeholder by replacement. The search goes on
+// after the inserted text, so a path that itself contains the placeholder
+// cannot make the replacement loop.
+bool replaceAll(wstring& text, const wchar_t* placeholder, const wstring& replacement) {
+    const size_t phLen = wcslen(placeholder);
+    bool replaced = false;
+    size_t pos = text.find(placeholder);
+    while (pos != wstring::npos) {
+        text.replace(pos, phLen, replacement);
+        replaced = true;
+        pos = text.find(placeholder, pos + replacement.length());
+    }
+    return replaced;
+}
+
+bool startsWith(const wstring& s, const wchar_t* prefix) { return s.compare(0, wcslen(prefix), prefix) == 0; }
+
+void appendForLog(wstring& log, const wstring& text) {
+    if (log.length() >= LOG_TEXT_LIMIT) return;
+    log.append(text, 0, LOG_TEXT_LIMIT - log.length());
+}
+
+}  // namespace
+
+bool replaceStdPlaceholders(const wstring& workspaceLocation, const wstring& installDir,
+                            wstring& placeholderString) {
+    bool modified = replaceAll(placeholderString, RCPHOME_REPLACE, installDir);
+    modified = replaceAll(placeholderString, WORKSPACELOCATION_REPLACE, workspaceLocation) || modified;
+    // The data area and the workspace are the same directory.
+    modified = replaceAll(placeholderString, RCPDATA_REPLACE, workspaceLocation) || modified;
+    return modified;
+}
+
+size_t findLastPlaceholder(const wstring& prop_contents, size_t prop_lastIndex, size_t& ph_numchars,
+                           wstring& ph_key) {
+    if (prop_contents.empty()) return wstring::npos;
+    // Nothing lies beyond the last character.
+    if (prop_lastIndex >= prop_contents.length()) prop_lastIndex = prop_contents.length() - 1;
+
+    const size_t ph_index = prop_contents.rfind(PH_OPEN, prop_lastIndex);
+    if (ph_index == wstring::npos) return wstring::npos;
+
+    // A closing brace beyond the limit is not used: the placeholder then ends
+    // at the limit ("${abc" at the end is read with the key "ab").
+    size_t endIndex = prop_contents.find(PH_CLOSE, ph_index);
+    if (endIndex == wstring::npos || endIndex > prop_lastIndex) endIndex = prop_lastIndex;
+
+    ph_numchars = endIndex - ph_index + 1;  // ph_index <= endIndex always holds
+    if (ph_numchars > 2)
+        ph_key = prop_contents.substr(ph_index + 2, ph_numchars - 3);
+    else
+        ph_key.clear();
+    return ph_index;
+}
+
+bool getPlaceholderValue(const wstring& key, wstring& value, const std::vector<String>& propArray) {
+    if (startsWith(key, ENV_PREFIX)) {
+        if (getEnv(key.c_str() + wcslen(ENV_PREFIX), value) != nullptr) return true;
+    } else if (startsWith(key, PROP_PREFIX)) {
+        String found = findProperty(key.c_str() + wcslen(PROP_PREFIX), propArray);
+        if (found != nullptr) {
+            value = found;
+            return true;
+        }
+    }
+    value = PH_OPEN + key + PH_CLOSE;  // written back as it was
+    return false;
+}
+
+bool replaceUserPlaceholders(wstring& prop_contents, const std::vector<String>& propArray) {
+    if (prop_contents.empty()) return true;
+
+    size_t prop_lastIndex = prop_contents.length() - 1;
+    size_t last_ph_index = wstring::npos;
+    bool bResult = true;
+    int cycle_cnt = 0;
+    size_t steps = 0;
+    size_t ph_numChars = 0;
+    wstring ph_key;
+    wstring value;
+    wstring logText;
+
+    for (;;) {
+        const size_t ph_index = findLastPlaceholder(prop_contents, prop_lastIndex, ph_numChars, ph_key);
+        if (ph_index == wstring::npos) break;
+
+        const bool logging = getDebug();
+        if (logging) {
+            logText.clear();
+            appendForLog(logText, prop_contents);
+        }
+
+        if (!getPlaceholderValue(ph_key, value, propArray)) bResult = false;
+        prop_contents.replace(ph_index, ph_numChars, value);
+
+        if (logging) {
+            appendForLog(logText, L" => ");
+            appendForLog(logText, prop_contents);
+            SvcDebugOutW(L"RLNCH0071I: Modified prop_contents %s", logText.c_str());
+        }
+
+        if (++steps > MAX_EXPANSION_STEPS || prop_contents.length() > MAX_EXPANDED_LENGTH) {
+            bResult = false;
+            break;
+        }
+
+        // Go on at the end of the inserted text, so that placeholders produced
+        // by the value are expanded next. An empty value inserted at the very
+        // start leaves nothing to the left to look at.
+        if (ph_index + value.length() == 0) break;
+        prop_lastIndex = ph_index + value.length() - 1;
+
+        // The first placeholder is always "smaller" than npos, so p = "${prop.p}"
+        // is stopped on its tenth repetition.
+        if (ph_index >= last_ph_index) {
+            if (++cycle_cnt >= MAX_PLACEHOLDER_CYCLES) {
+                bResult = false;
+                break;
+            }
+        } else {
+            cycle_cnt = 0;
+        }
+
+        if (!bResult) {
+            // Once a placeholder failed, the search only moves to the left of
+            // the one that was written back.
+            if (ph_index == 0) break;
+            prop_lastIndex = ph_index - 1;
+        }
+        last_ph_index = ph_index;
+    }
+    return bResult;
+}
+
+bool replaceAllPlaceholders(const wstring& workspaceLocation, const wstring& installDir,
+                            wstring& placeholderString, std::vector<String>& rcpInstallPropertiesArray) {
+    bool modified = replaceStdPlaceholders(workspaceLocation, installDir, placeholderString);
+    wstring temp = placeholderString;
+    if (!replaceUserPlaceholders(temp, rcpInstallPropertiesArray)) {
+        fatalErrorA("RLNCH0088E: property substitution is invalid (%ls)", temp.c_str(), true);
+    }
+    if (temp != placeholderString) {
+        placeholderString = temp;
+        modified = true;
+    }
+    return modified;
+}
+
+void replacePlaceholdersInRcpInstallProp(wstring workspaceLocation, wstring installDir,
+                                         std::vector<String>& rcpInstallPropertiesArray) {
+    convertBS2S(workspaceLocation);
+    convertBS2S(installDir);
+    // Values in array order: a "${prop.KEY}" sees KEY's value expanded when
+    // KEY came earlier in the file.
+    for (size_t i = 1; i < rcpInstallPropertiesArray.size(); i += 2) {
+        if (rcpInstallPropertiesArray[i] == nullptr) continue;
+        wstring value = rcpInstallPropertiesArray[i];
+        if (replaceAllPlaceholders(workspaceLocation, installDir, value, rcpInstallPropertiesArray)) {
+            String expanded = initMemString(newString(value.length() + 1), value.c_str());
+            freeString(rcpInstallPropertiesArray[i]);
+            rcpInstallPropertiesArray[i] = expanded;
+        }
+    }
+}
+
+void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wchar_t** argv, wchar_t** cargv,
+                               int argc) {
+    if (argv == nullptr || cargv == nullptr) return;
+    convertBS2S(workspaceLocation);
+    convertBS2S(installDir);
+    for (int i = 0; i < argc; ++i) {
+        if (argv[i] == nullptr) {
+            cargv[i] = unchangedArg;
+            continue;
+        }
+        wstring arg = argv[i];
+        if (replaceStdPlaceholders(workspaceLocation, installDir, arg)) {
+            // The old argument is not freed: it belongs to whoever built argv.
+            String changed = initMemString(newString(arg.length() + 1), arg.c_str());
+            argv[i] = changed;
+            cargv[i] = changed;
+        } else {
+            cargv[i] = unchangedArg;
+        }
+    }
+}
