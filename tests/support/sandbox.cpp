@@ -193,6 +193,34 @@ std::vector<std::string> listTree(const std::string& root) {
     return out;
 }
 
+std::vector<std::string> splitLines(const std::string& text) {
+    std::vector<std::string> out;
+    size_t start = 0;
+    while (start < text.size()) {
+        size_t end = text.find('\n', start);
+        if (end == std::string::npos) end = text.size();
+        out.push_back(text.substr(start, end - start));
+        start = end + 1;
+    }
+    return out;
+}
+
+std::vector<std::string> logLines(const std::string& log) {
+    std::vector<std::string> out;
+    for (auto& l : splitLines(log))
+        if (!l.empty()) out.push_back(l);
+    return out;
+}
+
+bool isErrorLine(const std::string& line, const std::string& message) {
+    std::string prefix = message + " : ";
+    if (line.compare(0, prefix.size(), prefix) != 0) return false;
+    std::string suffix = line.substr(prefix.size());
+    for (int e = 0; e < 256; e++)
+        if (suffix == strerror(e)) return true;
+    return false;
+}
+
 // ---------------------------------------------------------------------------
 
 Sandbox::Sandbox() {

@@ -90,6 +90,14 @@ FileState fileState(const std::string& path);
 // Every path below root, relative, sorted; directories end in "/".
 std::vector<std::string> listTree(const std::string& root);
 
+// The lines of a text without their line ends; empty lines are kept.
+std::vector<std::string> splitLines(const std::string& text);
+// The lines of a log that are not empty.
+std::vector<std::string> logLines(const std::string& log);
+// True when line is message + " : " + the system's text for some errno value:
+// the form of every error line of the launcher's log.
+bool isErrorLine(const std::string& line, const std::string& message);
+
 class Sandbox {
 public:
     static constexpr const char* kInstallId = "ID42";
@@ -140,6 +148,7 @@ public:
     // Runs the launcher and waits for it, then for the records of the
     // children it started, then (unless keepChildren) for those children.
     LaunchResult run(const RunOptions& opts);
+    LaunchResult run() { return run(RunOptions()); }
     LaunchResult run(const std::vector<std::string>& args) {
         RunOptions o;
         o.args = args;

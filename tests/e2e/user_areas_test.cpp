@@ -1,0 +1,285 @@
+// What a launch leaves in the user's areas: the files of a first launch,
+// their stability on later launches, resets, a second launcher while the
+// platform runs, and the launch variants decided during startup (a "-vm"
+// override, an initial configuration run).
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include "sandbox.h"
+#include "test_util.h"
+
+using namespace rcptest;
+
+namespace {
+
+const char* const kPlatformFiles[] = {"config.ini", "rcpinstall.properties", "org.eclipse.update/platform.xml"};
+
+// A first launch into an empty home creates exactly the user's areas and
+// files; a second launch leaves every per-user file alone even though the
+// installation's copies changed in between.
+TEST(UserAreas, FirstLaunchCreatesThePerUserFilesAndLaterLaunchesKeepThem) {
+    Sandbox sb;
+    sb.setupInstall("user", "com.kel.rcp.core.locale=fr_FR\n",
+                    "os.value.macosx=mac\n"
+                    "os.value.win32=win\\\n"
+                    "    continued\n"
+                    "os.value.linux=tux\n"
+                    "\n"
+                    "# trailing comment\n");
+    // "-resetconfig" on a first launch resets nothing and is not recorded.
+    LaunchResult first = sb.run({"-resetconfig", "-foo", "a b"});
+    ASSERT_EQ(first.status, 0) << first.tmpLog << first.log;
+    ASSERT_TRUE(first.hasChild());
+    EXPECT_FALSE(first.tmpLogWritten);
+    EXPECT_EQ(first.terminal, "");
+
+    const std::string ws = "KEL/RCP/ID42/tester/";
+    const std::vector<std::string> expectedTree = {
+        "KEL/", "KEL/RCP/", "KEL/RCP/ID42/", ws,
+        ws + ".config/", ws + ".config/args.properties", ws + ".config/config.ini",
+        ws + ".config/org.eclipse.update/", ws + ".config/org.eclipse.update/platform.xml",
+        ws + ".config/rcpinstall.properties", ws + ".rcp.lock",
+        ws + "applications/", ws + "applications/eclipse/", ws + "applications/eclipse/features/",
+        ws + "applications/eclipse/plugins/", ws + "logs/", ws + "logs/rcplauncher.log"};
+    EXPECT_EQ(listTree(sb.home()), expectedTree);
+
+    const std::string cfg = sb.defaultConfig();
+    EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher() + "\narg1=-foo\narg2=a b\nargc=3\n");
+    EXPECT_EQ(readText(cfg + "/config.ini"), Sandbox::standardConfigIni());
+    EXPECT_EQ(readText(cfg + "/org.eclipse.update/platform.xml"),
+              "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n"
+              "<site url=\"platform:/base/\" enabled=\"true\">\n<feature>\n</site>\n</config>\n");
+    EXPECT_EQ(readText(cfg + "/rcpinstall.properties"),
+              Sandbox::standardInstallProperties() +
+                  "os.value=mac\n"
+                  "# trailing comment\n"
+                  "rcp.install.id=ID42\n"
+                  "vm=${rcp.home}/jre/bin/java\n"
+                  "rcp.base.location=${rcp.home}/base\n"
+                  "install.configuration=user\n"
+                  "com.kel.rcp.core.locale=fr_FR\n");
+    EXPECT_EQ(readText(sb.defaultWorkspace() + "/.rcp.lock"),
+              std::to_string(first.child().pid) + std::string(10, ' '));
+
+    std::map<std::string, FileState> before;
+    for (const char* f : kPlatformFiles) before[f] = fileState(cfg + "/" + f);
+    sb.writeBase("config.ini", "changed=1\n");
+    sb.writeBase("platform.xml", "<changed/>\n");
+    sb.writeBase("rcpinstall.properties", "changed=1\n");
+    sb.writeLauncherProperties(Sandbox::standardLauncherProperties("user") + "com.kel.rcp.core.bidi=true\n");
+
+    LaunchResult second = sb.run({"-foo", "a b"});
+    ASSERT_EQ(second.status, 0) << second.log;
+    EXPECT_EQ(listTree(sb.home()), expectedTree);
+    for (const char* f : kPlatformFiles) EXPECT_TRUE(fileState(cfg + "/" + f) == before[f]) << f;
+    EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher() + "\narg1=-foo\narg2=a b\nargc=3\n");
+    EXPECT_EQ(second.child().argv, first.child().argv);
+}
+
+// Only "-resetconfig" typed on the command line of a later launch resets:
+// the configuration area goes to its backup, the listed plug-in state
+// directories go, and the files come back from the installation's copies.
+TEST(UserAreas, ResetComesOnlyFromTheTypedCommandLine) {
+    Sandbox sb;
+    sb.setupInstall("user", "config.rs.1=-resetconfig\n", "resetDir.a=org.x\n");
+    const std::string ws = sb.defaultWorkspace();
+    const std::string cfg = sb.defaultConfig();
+
+    ASSERT_EQ(sb.run({"-resetconfig"}).status, 0);
+    EXPECT_FALSE(pathExists(ws + "/.configbak"));
+    writeText(cfg + "/marker", "old area");
+    writeText(ws + "/.metadata/.plugins/org.x/state", "x");
+    writeText(ws + "/.metadata/.plugins/org.y/state", "y");
+
+    // "-resetconfig" coming from the launcher properties is not a request.
+    LaunchResult fromProps = sb.run({"-config", "rs"});
+    ASSERT_EQ(fromProps.status, 0) << fromProps.log;
+    EXPECT_FALSE(pathExists(ws + "/.configbak"));
+    EXPECT_TRUE(pathExists(cfg + "/marker"));
+    EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.x/state"));
+
+    sb.writeBase("config.ini", "fresh=1\n");
+    LaunchResult reset = sb.run({"-resetconfig"});
+    ASSERT_EQ(reset.status, 0) << reset.log;
+    ASSERT_TRUE(reset.hasChild());
+    EXPECT_EQ(readText(ws + "/.configbak/marker"), "old area");
+    EXPECT_FALSE(pathExists(cfg + "/marker"));
+    EXPECT_EQ(readText(cfg + "/config.ini"), "fresh=1\n");
+    EXPECT_TRUE(pathExists(cfg + "/rcpinstall.properties"));
+    EXPECT_TRUE(pathExists(cfg + "/org.eclipse.update/platform.xml"));
+    EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher() + "\nargc=1\n");
+    EXPECT_FALSE(pathExists(ws + "/.metadata/.plugins/org.x"));
+    EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.y/state"));
+    EXPECT_EQ(reset.child().argIndex("-resetconfig"), -1);
+}
+
+// A configuration area written by another installation is set aside for a
+// fresh one, keeping its platform.xml beside it in the workspace.
+TEST(UserAreas, AreaOfAnotherInstallationIsSetAside) {
+    Sandbox sb;
+    const std::string data = sb.path("data");
+    sb.setupInstall("user", "rcp.data=" + data + "/\n");
+    ASSERT_EQ(sb.run().status, 0);
+    const std::string oldPlatformXml = readText(data + "/.config/org.eclipse.update/platform.xml");
+    ASSERT_FALSE(oldPlatformXml.empty());
+
+    sb.writeLauncherProperties("rcp.install.id=ID43\nrcp.base.location=${rcp.home}/base\n"
+                               "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=user\n"
+                               "rcp.data=" + data + "/\n");
+    LaunchResult r = sb.run();
+    ASSERT_EQ(r.status, 0) << r.log;
+    EXPECT_EQ(r.workspace, data);
+    EXPECT_EQ(readText(data + "/platform.xml.old"), oldPlatformXml);
+    EXPECT_NE(readText(data + "/.configbak/rcpinstall.properties").find("rcp.install.id=ID42\n"), std::string::npos);
+    EXPECT_NE(readText(data + "/.config/rcpinstall.properties").find("rcp.install.id=ID43\n"), std::string::npos);
+    EXPECT_NE(r.child().argIndex("-Dcom.kel.rcp.install.id=ID43"), -1);
+}
+
+// While a platform started by an earlier launch runs, a second launcher
+// hands over to it: it still starts a child, with "-useDaemon" and the
+// running platform's process id, but leaves the startup record and the lock
+// file as the main launcher wrote them.
+TEST(UserAreas, SecondLauncherHandsOverToTheRunningPlatform) {
+    Sandbox sb;
+    sb.setupInstall("user");
+    const std::string lock = sb.defaultWorkspace() + "/.rcp.lock";
+    const std::string record = sb.defaultConfig() + "/args.properties";
+
+    RunOptions firstRun;
+    firstRun.args = {"-first"};
+    firstRun.env = {{"RCP_STUB_SLEEP", "120"}};
+    firstRun.keepChildren = true;
+    LaunchResult first = sb.run(firstRun);
+    ASSERT_EQ(first.status, 0) << first.log;
+    ASSERT_TRUE(first.hasChild());
+    const std::string platformPid = std::to_string(first.child().pid);
+    EXPECT_EQ(first.child().argIndex("-useDaemon"), -1);
+
+    LaunchResult second = sb.run({"-second"});
+    ASSERT_EQ(second.status, 0) << second.log;
+    ASSERT_TRUE(second.hasChild());
+    int vm = second.child().argIndex("-vm");
+    ASSERT_NE(vm, -1);
+    const auto& argv = second.child().argv;
+    ASSERT_GT(argv.size(), static_cast<size_t>(vm) + 3);
+    EXPECT_EQ(argv[static_cast<size_t>(vm) + 2], "-useDaemon");
+    EXPECT_EQ(argv[static_cast<size_t>(vm) + 3], platformPid);
+    EXPECT_EQ(readText(record), "arg0=" + sb.launcher() + "\narg1=-first\nargc=2\n");
+    EXPECT_EQ(readText(lock), platformPid + std::string(10, ' '));
+
+    sb.killChildren();
+    LaunchResult third = sb.run({"-third"});
+    ASSERT_EQ(third.status, 0) << third.log;
+    EXPECT_EQ(third.child().argIndex("-useDaemon"), -1);
+    EXPECT_EQ(readText(record), "arg0=" + sb.launcher() + "\narg1=-third\nargc=2\n");
+    EXPECT_EQ(readText(lock), std::to_string(third.child().pid) + std::string(10, ' '));
+}
+
+// A JVM named with "-vm" brings the jvm.properties three levels above it; a
+// path too shallow for that stops the startup before the command line is
+// built, so no child runs, though the user's files are in place.
+TEST(UserAreas, VmOverrideAndItsJvmProperties) {
+    struct Case {
+        std::string vm;
+        bool child;
+        std::string jvmProps;      // written relative to the sandbox root
+        std::string expectedArg;   // an argument the child must get
+    };
+    const std::vector<Case> cases = {
+        {"java", false, "", ""},
+        {"bin/java", false, "", ""},
+        {"/jre/bin/java", true, "", ""},
+        {"@/j/jre/bin/java", true, "j/jvm.properties", "-Dfrom.jvm.props=1"},
+        {"k\\jre\\bin\\java", true, "k/jvm.properties", "-Dfrom.jvm.props=1"},
+    };
+    for (const auto& c : cases) {
+        Sandbox sb;
+        std::string vm = c.vm[0] == '@' ? sb.root() + c.vm.substr(1) : c.vm;
+        SCOPED_TRACE(vm);
+        sb.setupInstall("user");
+        if (!c.jvmProps.empty()) sb.writeFile(c.jvmProps, "-Dfrom.jvm.props=1\n");
+        RunOptions o;
+        o.args = {"-vm", vm};
+        o.expectChildren = c.child ? 1 : 0;
+        LaunchResult r = sb.run(o);
+        EXPECT_EQ(r.status, 0) << r.log;
+        EXPECT_EQ(r.hasChild(), c.child);
+        EXPECT_TRUE(pathExists(sb.defaultConfig() + "/rcpinstall.properties"));
+        EXPECT_EQ(pathExists(sb.defaultConfig() + "/org.eclipse.update"), c.child);
+        if (!c.child) continue;
+        EXPECT_EQ(r.child().argAfter("-vm"), vm);
+        if (!c.expectedArg.empty()) {
+            EXPECT_NE(r.child().argIndex(c.expectedArg), -1);
+        }
+    }
+}
+
+// A platform that has not finished its initial configuration is started
+// with the "config.initial" arguments and the user's "-data" only.
+TEST(UserAreas, InitialConfigurationLaunch) {
+    struct Case {
+        const char* name;
+        std::string configuration;
+        std::string installExtra;
+        bool withData;
+        bool initial;
+    };
+    const std::vector<Case> cases = {
+        {"not yet configured", "user", "", true, true},
+        {"not yet configured, default workspace", "user", "", false, true},
+        {"configured", "user", "rcp.initial.done=true\n", true, false},
+        {"lockdown never", "lockdown", "", true, false},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.name);
+        Sandbox sb;
+        sb.setupInstall(c.configuration,
+                        "config.initial.1=-initialCompleteFlag\nconfig.initial.2=rcp.initial.done\n",
+                        c.installExtra);
+        const std::string data = sb.path("ws");
+        std::vector<std::string> args = {"-foo"};
+        if (c.withData) args.insert(args.end(), {"-data", data});
+        args.insert(args.end(), {"-vmargs", "-Dx=1"});
+        LaunchResult r = sb.run(args);
+        ASSERT_EQ(r.status, 0) << r.log;
+        const auto& argv = r.child().argv;
+        ASSERT_GT(argv.size(), 4u);
+        EXPECT_EQ(r.workspace, c.withData ? data : sb.defaultWorkspace());
+        if (c.initial) {
+            EXPECT_EQ(argv[1], "-initialCompleteFlag");
+            EXPECT_EQ(argv[2], "rcp.initial.done");
+            EXPECT_EQ(argv[3], "-data");
+            EXPECT_EQ(r.child().argIndex("-foo"), -1);
+            EXPECT_EQ(r.child().argIndex("-Dx=1"), -1);
+        } else {
+            EXPECT_EQ(argv[1], "-foo");
+            EXPECT_EQ(r.child().argIndex("-initialCompleteFlag"), -1);
+            EXPECT_NE(r.child().argIndex("-Dx=1"), -1);
+        }
+    }
+}
+
+// Only the first "${rcp.home}" of the base location is the installation
+// directory when the per-user files are taken from it.
+TEST(UserAreas, BaseLocationExpandsOnlyItsFirstRcpHome) {
+    Sandbox sb;
+    sb.setupInstall("user");
+    sb.writeLauncherProperties("rcp.install.id=ID42\nrcp.base.location=${rcp.home}/base${rcp.home}\n"
+                               "jvm.location=/j\ninstall.configuration=user\n");
+    const std::string literal = sb.inst() + "/base${rcp.home}";
+    sb.writeFile(literal + "/config.ini", "from=literal\n");
+    sb.writeFile(literal + "/rcpinstall.properties", "a=1\n");
+    sb.writeFile(literal + "/platform.xml", "<config/>\n");
+
+    LaunchResult r = sb.run();
+    EXPECT_EQ(readText(sb.defaultConfig() + "/config.ini"), "from=literal\n");
+    // The command line expands every occurrence; that program does not exist.
+    EXPECT_EQ(r.status, 255);
+    std::vector<std::string> lines = logLines(r.log);
+    ASSERT_FALSE(lines.empty());
+    EXPECT_TRUE(isErrorLine(lines.back(), "RLNCH0007E: " + sb.inst() + "/base" + sb.inst() +
+                                              "/macosx/x86/eclipse is not executable or does not exist."))
+        << r.log;
+}
+
+}  // namespace
