@@ -22,8 +22,8 @@ const int MAX_PLACEHOLDER_CYCLES = 10;
 
 // Values that expand each other can double the text at every step; past
 // these bounds the expansion is treated like a self-referencing value.
-const size_t MAX_EXPANDED_LENGTH = 1u << 18;
-const size_t MAX_EXPANSION_STEPS = 10000;
+const size_t MAX_EXPANDED_LENGTH = 1u << 17;
+const size_t MAX_EXPANSION_STEPS = 4096;
 
 // The debug line is cut at 4096 bytes anyway; no need to copy more of a long
 // text into it.
@@ -32,19 +32,24 @@ const size_t LOG_TEXT_LIMIT = 4096;
 // Shared target of the argument marks that say "not changed"; never freed.
 wchar_t unchangedArg[1] = {0};
 
-// Replaces every occurrence of placeholder by replacement. The search goes on
-// after the inserted text, so a path that itself contains the placeholder
-// cannot make the replacement loop.
+// Replaces every occurrence of placeholder by replacement, in one pass. The
+// search goes on after the inserted text, so a path that itself contains the
+// placeholder cannot make the replacement loop.
 bool replaceAll(wstring& text, const wchar_t* placeholder, const wstring& replacement) {
     const size_t phLen = wcslen(placeholder);
-    bool replaced = false;
     size_t pos = text.find(placeholder);
+    if (pos == wstring::npos) return false;
+    wstring result;
+    size_t from = 0;
     while (pos != wstring::npos) {
-        text.replace(pos, phLen, replacement);
-        replaced = true;
-        pos = text.find(placeholder, pos + replacement.length());
+        result.append(text, from, pos - from);
+        result += replacement;
+        from = pos + phLen;
+        pos = text.find(placeholder, from);
     }
-    return replaced;
+    result.append(text, from, wstring::npos);
+    text.swap(result);
+    return true;
 }
 
 bool startsWith(const wstring& s, const wchar_t* prefix) { return s.compare(0, wcslen(prefix), prefix) == 0; }
