@@ -103,7 +103,7 @@ void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
 
     String splashPath = findProperty(OSGI_SPLASH_PATH, rcpLauncherPropertiesArray);
     if (splashPath != nullptr) {
-        setArgProperty(commandArg, (wstring(L"-D") + OSGI_SPLASH_PATH).c_str(), splashPath);
+        setArgProperty(commandArg, (wstring(SYSPROP_PREFIX) + OSGI_SPLASH_PATH).c_str(), splashPath);
         addArgToCommandLine(commandArg);
     }
 
@@ -124,17 +124,17 @@ void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
     addArgToCommandLine(commandArg);
 
     // Every "-D" entry, even with an empty value (the JVM then sees "key=").
-    forEachProperty(L"-D", rcpInstallPropertiesArray, [&](const wchar_t* key, const wchar_t* value) {
+    forEachProperty(SYSPROP_PREFIX, rcpInstallPropertiesArray, [&](const wchar_t* key, const wchar_t* value) {
         setArgProperty(commandArg, key, value);
         addArgToCommandLine(commandArg);
         SvcDebugOutW(L"RLNCH0075I: commandArg  = \"%s\"", commandArg.c_str());
         return true;
     });
 
-    wstring installArea = installDir + L"/eclipse";
+    wstring installArea = installDir + INSTALL_AREA_DIR;
     convertToOsSeparator(installArea);
     if (!exists(installArea.c_str())) {
-        installArea = installDir + L"/rcp/eclipse";
+        installArea = installDir + INSTALL_AREA_FALLBACK_DIR;
         convertToOsSeparator(installArea);
     }
     setArgProperty(commandArg, D_OSGI_INSTALL_AREA, installArea.c_str());
@@ -144,7 +144,7 @@ void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
 void addXargsToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
     // The reader splits "-Xmx=512m" at the "=" and keeps it in the value, so
     // joining key and value gives the option text back.
-    forEachProperty(L"-X", rcpInstallPropertiesArray, [](const wchar_t* key, const wchar_t* value) {
+    forEachProperty(XARG_PREFIX, rcpInstallPropertiesArray, [](const wchar_t* key, const wchar_t* value) {
         addArgToCommandLine(wstring(key) + value);
         return true;
     });

@@ -124,6 +124,11 @@ inline constexpr const wchar_t* D_RCP_DATA = L"-Drcp.data";
 inline constexpr const wchar_t* D_RCP_INSTALL_ID_PROP = L"-Dcom.kel.rcp.install.id";
 inline constexpr const wchar_t* D_CONFIG = L"-Drcp.install.config";
 inline constexpr const wchar_t* D_OSGI_INSTALL_AREA = L"-Drcp.osgi.install.area";
+inline constexpr const wchar_t* INSTALL_AREA_DIR = L"/eclipse";
+inline constexpr const wchar_t* INSTALL_AREA_FALLBACK_DIR = L"/rcp/eclipse";
+inline constexpr const wchar_t* SYSPROP_PREFIX = L"-D";  // install properties passed as system properties
+inline constexpr const wchar_t* XARG_PREFIX = L"-X";     // install properties passed as -X options
+inline constexpr const wchar_t* TRUE_VALUE = L"true";
 inline constexpr const wchar_t* XBOOTCLASSPATH_P = L"-Xbootclasspath/p:";
 inline constexpr const wchar_t* XBOOTCLASSPATH_A = L"-Xbootclasspath/a:";
 inline constexpr const wchar_t* EQUALS_CHAR = L"=";

@@ -37,7 +37,7 @@ bool isInitialRequired(std::vector<String> rcpLauncherPropertiesArray,
     // matches as a prefix, so "config.initial.1" also finds "config.initial.10".
     std::vector<const wchar_t*> config_vector;
     for (size_t i = 1; i <= size / 2; i++) {
-        wstring configStr = L"config.initial." + std::to_wstring(i);
+        wstring configStr = CONFIG_INITIAL_PREFIX + std::to_wstring(i);
         bool found = false;
         for (size_t j = 0; j < size; j += 2) {
             if (wcsncmp(config_initial[j], configStr.c_str(), configStr.size()) == 0) {
@@ -71,14 +71,14 @@ bool isInitialRequired(std::vector<String> rcpLauncherPropertiesArray,
     const wchar_t* key_name = config_vector[flagPos + 2];
 
     String completed = findProperty(key_name, rcpInstallPropertiesArray);
-    return !(completed != nullptr && wcsncmp(completed, L"true", 4) == 0);
+    return !(completed != nullptr && wcsncmp(completed, TRUE_VALUE, wcslen(TRUE_VALUE)) == 0);
 }
 
 void checkForProvisioning(const wstring& workspaceLocation, int argc, wchar_t** argv, const wstring& installDir,
                           std::vector<String>& rcpInstallPropertiesArray,
                           std::vector<String>& rcpLauncherPropertiesArray, const std::vector<wstring>& launchArgs) {
     String provisioning = findProperty(PROVISIONING, rcpLauncherPropertiesArray);
-    if (provisioning == nullptr || wcscmp(provisioning, L"true") != 0) return;
+    if (provisioning == nullptr || wcscmp(provisioning, TRUE_VALUE) != 0) return;
     if (eConfig != user && eConfig != multiuser && eConfig != lockdown) return;
 
     String provisionedVersion = findProperty(PROV_MANIFEST_VERSION, rcpInstallPropertiesArray);
