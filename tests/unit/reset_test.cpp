@@ -41,7 +41,7 @@ protected:
 };
 
 TEST_F(ResetTest, ResetKeepsRegistryReplacesTheBackupAndClearsListedPluginState) {
-    makeArea("resetDir.a=org.x\nresetDir.b = org.y\nresetDir.c=org.none\nresetDir.d=../../out\n", true);
+    makeArea("resetDir.a=org.x\nresetDir.b = org.y\nresetDir.c=org.none\nresetDir.d=../../../out\n", true);
     writeText(tmp.sub("out/keep"), "mine");
     writeText(ws(".configbak/stale"), "older backup");
 
