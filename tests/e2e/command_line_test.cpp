@@ -98,7 +98,7 @@ TEST(CommandLine, EveryInstallConfiguration) {
         Sandbox sb;
         sb.setupInstall(c.property, "", kLibPath);
         LaunchResult r = sb.run(userRun(args));
-        ASSERT_EQ(r.status, 0) << r.tmpLog << r.log;
+        ASSERT_EQ(r.status, 0) << r.describe();
         ASSERT_EQ(r.children.size(), 1u);
         EXPECT_EQ(r.child().argv, expectedArgs(sb, {c.word, {"-foo", "a b"}, {"-Duser.vm=1"}}));
         EXPECT_EQ(r.child().env, expectedEnv(sb, r));
@@ -131,7 +131,7 @@ TEST(CommandLine, UnknownOrMissingInstallConfigurationEndsTheLaunch) {
         EXPECT_FALSE(r.hasChild());
         std::vector<std::string> lines = logLines(r.log);
         ASSERT_FALSE(lines.empty());
-        EXPECT_TRUE(isErrorLine(lines.back(), c.message)) << r.log;
+        EXPECT_TRUE(isErrorLine(lines.back(), c.message)) << r.describe();
         EXPECT_EQ(r.terminal, "");
     }
 }
@@ -160,7 +160,7 @@ TEST(CommandLine, ConfigExtensionsFromLauncherProperties) {
         Sandbox sb;
         sb.setupInstall("user", props, kLibPath);
         LaunchResult r = sb.run(userRun(c.args));
-        ASSERT_EQ(r.status, 0) << r.tmpLog << r.log;
+        ASSERT_EQ(r.status, 0) << r.describe();
         EXPECT_EQ(r.child().argv, expectedArgs(sb, {"user", c.passThrough, c.userVmargs}));
     }
 }
@@ -184,9 +184,9 @@ TEST(CommandLine, DebugOutputFromTheEffectiveArguments) {
     for (const auto& c : cases) {
         SCOPED_TRACE(::testing::PrintToString(c.args));
         LaunchResult r = sb.run(c.args);
-        ASSERT_EQ(r.status, 0) << r.tmpLog << r.log;
+        ASSERT_EQ(r.status, 0) << r.describe();
         bool logged = r.log.find("RLNCH0132I: ===== Begin Parameters =====") != std::string::npos;
-        EXPECT_EQ(logged, c.debug) << r.log;
+        EXPECT_EQ(logged, c.debug) << r.describe();
         EXPECT_EQ(r.child().argIndex("-debug") != -1, c.debug);
         EXPECT_EQ(r.terminal, "");
     }

@@ -29,7 +29,7 @@ TEST(Foundation, VersionWritesOnlyTheVersionLine) {
         EXPECT_EQ(r.terminal, "");
         std::vector<std::string> lines = splitLines(r.tmpLog);
         // The queue is written with one empty line after it.
-        ASSERT_EQ(lines.size(), 2u) << r.tmpLog;
+        ASSERT_EQ(lines.size(), 2u) << r.describe();
         EXPECT_TRUE(isErrorLine(lines[0], "RLNCH0031I:   version = \"2006-06-27\"")) << lines[0];
         EXPECT_EQ(lines[1], "");
         EXPECT_TRUE(listTree(sb.home()).empty()) << "nothing may be created";
@@ -52,7 +52,7 @@ TEST(Foundation, LinksToTheLauncherResolveToTheRealInstallation) {
         RunOptions o;
         o.program = program;
         LaunchResult r = sb.run(o);
-        ASSERT_EQ(r.status, 0) << r.tmpLog << r.log;
+        ASSERT_EQ(r.status, 0) << r.describe();
         ASSERT_TRUE(r.hasChild());
         EXPECT_EQ(r.child().argv.at(0), sb.eclipse());
         EXPECT_NE(r.child().argIndex("-Drcp.home=" + sb.inst()), -1);
@@ -80,7 +80,7 @@ TEST(Foundation, LauncherOutsideAnRcpDirectoryHasNoInstallation) {
         EXPECT_EQ(r.status, 255);
         EXPECT_FALSE(r.hasChild());
         std::vector<std::string> lines = logLines(r.tmpLog);
-        ASSERT_EQ(lines.size(), 1u) << r.tmpLog;
+        ASSERT_EQ(lines.size(), 1u) << r.describe();
         EXPECT_TRUE(isErrorLine(lines[0], "RLNCH0014E: Unable to load /rcp/rcplauncher.properties file!")) << lines[0];
         EXPECT_TRUE(listTree(sb.home()).empty());
         EXPECT_EQ(r.terminal, "");
@@ -118,7 +118,7 @@ TEST(Foundation, EarlyFailuresGoToTheFallbackLog) {
         std::vector<std::string> lines = logLines(r.tmpLog);
         ASSERT_FALSE(lines.empty());
         // With "-debug" the queued debug lines come first; the fatal one ends it.
-        EXPECT_TRUE(isErrorLine(lines.back(), message)) << r.tmpLog;
+        EXPECT_TRUE(isErrorLine(lines.back(), message)) << r.describe();
         EXPECT_TRUE(listTree(sb.home()).empty());
         EXPECT_EQ(r.terminal, "");
     }

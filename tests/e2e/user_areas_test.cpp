@@ -4,6 +4,7 @@
 // override, an initial configuration run).
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include "sandbox.h"
 #include "test_util.h"
@@ -28,7 +29,7 @@ TEST(UserAreas, FirstLaunchCreatesThePerUserFilesAndLaterLaunchesKeepThem) {
                     "# trailing comment\n");
     // "-resetconfig" on a first launch resets nothing and is not recorded.
     LaunchResult first = sb.run({"-resetconfig", "-foo", "a b"});
-    ASSERT_EQ(first.status, 0) << first.tmpLog << first.log;
+    ASSERT_EQ(first.status, 0) << first.describe();
     ASSERT_TRUE(first.hasChild());
     EXPECT_FALSE(first.tmpLogWritten);
     EXPECT_EQ(first.terminal, "");
@@ -69,7 +70,7 @@ TEST(UserAreas, FirstLaunchCreatesThePerUserFilesAndLaterLaunchesKeepThem) {
     sb.writeLauncherProperties(Sandbox::standardLauncherProperties("user") + "com.kel.rcp.core.bidi=true\n");
 
     LaunchResult second = sb.run({"-foo", "a b"});
-    ASSERT_EQ(second.status, 0) << second.log;
+    ASSERT_EQ(second.status, 0) << second.describe();
     EXPECT_EQ(listTree(sb.home()), expectedTree);
     for (const char* f : kPlatformFiles) EXPECT_TRUE(fileState(cfg + "/" + f) == before[f]) << f;
     EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher() + "\narg1=-foo\narg2=a b\nargc=3\n");
@@ -85,7 +86,8 @@ TEST(UserAreas, ResetComesOnlyFromTheTypedCommandLine) {
     const std::string ws = sb.defaultWorkspace();
     const std::string cfg = sb.defaultConfig();
 
-    ASSERT_EQ(sb.run({"-resetconfig"}).status, 0);
+    LaunchResult first = sb.run({"-resetconfig"});
+    ASSERT_EQ(first.status, 0) << first.describe();
     EXPECT_FALSE(pathExists(ws + "/.configbak"));
     writeText(cfg + "/marker", "old area");
     writeText(ws + "/.metadata/.plugins/org.x/state", "x");
@@ -93,14 +95,14 @@ TEST(UserAreas, ResetComesOnlyFromTheTypedCommandLine) {
 
     // "-resetconfig" coming from the launcher properties is not a request.
     LaunchResult fromProps = sb.run({"-config", "rs"});
-    ASSERT_EQ(fromProps.status, 0) << fromProps.log;
+    ASSERT_EQ(fromProps.status, 0) << fromProps.describe();
     EXPECT_FALSE(pathExists(ws + "/.configbak"));
     EXPECT_TRUE(pathExists(cfg + "/marker"));
     EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.x/state"));
 
     sb.writeBase("config.ini", "fresh=1\n");
     LaunchResult reset = sb.run({"-resetconfig"});
-    ASSERT_EQ(reset.status, 0) << reset.log;
+    ASSERT_EQ(reset.status, 0) << reset.describe();
     ASSERT_TRUE(reset.hasChild());
     EXPECT_EQ(readText(ws + "/.configbak/marker"), "old area");
     EXPECT_FALSE(pathExists(cfg + "/marker"));
@@ -119,7 +121,8 @@ TEST(UserAreas, AreaOfAnotherInstallationIsSetAside) {
     Sandbox sb;
     const std::string data = sb.path("data");
     sb.setupInstall("user", "rcp.data=" + data + "/\n");
-    ASSERT_EQ(sb.run().status, 0);
+    LaunchResult first = sb.run();
+    ASSERT_EQ(first.status, 0) << first.describe();
     const std::string oldPlatformXml = readText(data + "/.config/org.eclipse.update/platform.xml");
     ASSERT_FALSE(oldPlatformXml.empty());
 
@@ -127,7 +130,7 @@ TEST(UserAreas, AreaOfAnotherInstallationIsSetAside) {
                                "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=user\n"
                                "rcp.data=" + data + "/\n");
     LaunchResult r = sb.run();
-    ASSERT_EQ(r.status, 0) << r.log;
+    ASSERT_EQ(r.status, 0) << r.describe();
     EXPECT_EQ(r.workspace, data);
     EXPECT_EQ(readText(data + "/platform.xml.old"), oldPlatformXml);
     EXPECT_NE(readText(data + "/.configbak/rcpinstall.properties").find("rcp.install.id=ID42\n"), std::string::npos);
@@ -150,13 +153,13 @@ TEST(UserAreas, SecondLauncherHandsOverToTheRunningPlatform) {
     firstRun.env = {{"RCP_STUB_SLEEP", "120"}};
     firstRun.keepChildren = true;
     LaunchResult first = sb.run(firstRun);
-    ASSERT_EQ(first.status, 0) << first.log;
+    ASSERT_EQ(first.status, 0) << first.describe();
     ASSERT_TRUE(first.hasChild());
     const std::string platformPid = std::to_string(first.child().pid);
     EXPECT_EQ(first.child().argIndex("-useDaemon"), -1);
 
     LaunchResult second = sb.run({"-second"});
-    ASSERT_EQ(second.status, 0) << second.log;
+    ASSERT_EQ(second.status, 0) << second.describe();
     ASSERT_TRUE(second.hasChild());
     int vm = second.child().argIndex("-vm");
     ASSERT_NE(vm, -1);
@@ -169,10 +172,37 @@ TEST(UserAreas, SecondLauncherHandsOverToTheRunningPlatform) {
 
     sb.killChildren();
     LaunchResult third = sb.run({"-third"});
-    ASSERT_EQ(third.status, 0) << third.log;
+    ASSERT_EQ(third.status, 0) << third.describe();
     EXPECT_EQ(third.child().argIndex("-useDaemon"), -1);
     EXPECT_EQ(readText(record), "arg0=" + sb.launcher() + "\narg1=-third\nargc=2\n");
     EXPECT_EQ(readText(lock), std::to_string(third.child().pid) + std::string(10, ' '));
+}
+
+// Only the main launcher runs the provisioning check: a fresh user gets a
+// provisioning run (and no platform), while a launcher that finds a running
+// platform starts a normal child handed to it and writes no startup record.
+TEST(UserAreas, ProvisioningOnlyInTheMainLauncher) {
+    for (bool platformRuns : {false, true}) {
+        SCOPED_TRACE(platformRuns ? "platform running" : "no platform");
+        Sandbox sb;
+        sb.setupInstall("user", "provisioning=true\nprovisioning.manifest.version=2\n",
+                        "provisioning.application=com.kel.provision\n");
+        // This test process stands for the running platform.
+        const std::string runningPid = std::to_string(getpid());
+        if (platformRuns) writeText(sb.defaultWorkspace() + "/.rcp.lock", runningPid);
+
+        LaunchResult r = sb.run();
+        ASSERT_EQ(r.status, 0) << r.describe();
+        ASSERT_EQ(r.children.size(), 1u);
+        const ChildRecord& child = r.child();
+        EXPECT_EQ(child.argIndex("com.kel.provision") != -1, !platformRuns);
+        EXPECT_EQ(child.argIndex("-userProvLaunch") != -1, !platformRuns);
+        EXPECT_EQ(child.argAfter("-useDaemon"), platformRuns ? runningPid : "");
+        EXPECT_EQ(pathExists(sb.defaultConfig() + "/args.properties"), !platformRuns);
+        // A provisioning child is waited for, never recorded as the platform;
+        // a secondary launcher leaves the running platform's id alone.
+        EXPECT_EQ(readText(sb.defaultWorkspace() + "/.rcp.lock"), platformRuns ? runningPid : "");
+    }
 }
 
 // A JVM named with "-vm" brings the jvm.properties three levels above it; a
@@ -191,23 +221,26 @@ TEST(UserAreas, VmOverrideAndItsJvmProperties) {
         {"/jre/bin/java", true, "", ""},
         {"@/j/jre/bin/java", true, "j/jvm.properties", "-Dfrom.jvm.props=1"},
         {"k\\jre\\bin\\java", true, "k/jvm.properties", "-Dfrom.jvm.props=1"},
+        // "-vm" without a value: the installation's JVM.
+        {"", true, "", ""},
     };
     for (const auto& c : cases) {
         Sandbox sb;
-        std::string vm = c.vm[0] == '@' ? sb.root() + c.vm.substr(1) : c.vm;
+        std::string vm = !c.vm.empty() && c.vm[0] == '@' ? sb.root() + c.vm.substr(1) : c.vm;
         SCOPED_TRACE(vm);
         sb.setupInstall("user");
         if (!c.jvmProps.empty()) sb.writeFile(c.jvmProps, "-Dfrom.jvm.props=1\n");
         RunOptions o;
-        o.args = {"-vm", vm};
+        o.args = {"-vm"};
+        if (!vm.empty()) o.args.push_back(vm);
         o.expectChildren = c.child ? 1 : 0;
         LaunchResult r = sb.run(o);
-        EXPECT_EQ(r.status, 0) << r.log;
+        EXPECT_EQ(r.status, 0) << r.describe();
         EXPECT_EQ(r.hasChild(), c.child);
         EXPECT_TRUE(pathExists(sb.defaultConfig() + "/rcpinstall.properties"));
         EXPECT_EQ(pathExists(sb.defaultConfig() + "/org.eclipse.update"), c.child);
         if (!c.child) continue;
-        EXPECT_EQ(r.child().argAfter("-vm"), vm);
+        EXPECT_EQ(r.child().argAfter("-vm"), vm.empty() ? sb.jvm() : vm);
         if (!c.expectedArg.empty()) {
             EXPECT_NE(r.child().argIndex(c.expectedArg), -1);
         }
@@ -241,7 +274,7 @@ TEST(UserAreas, InitialConfigurationLaunch) {
         if (c.withData) args.insert(args.end(), {"-data", data});
         args.insert(args.end(), {"-vmargs", "-Dx=1"});
         LaunchResult r = sb.run(args);
-        ASSERT_EQ(r.status, 0) << r.log;
+        ASSERT_EQ(r.status, 0) << r.describe();
         const auto& argv = r.child().argv;
         ASSERT_GT(argv.size(), 4u);
         EXPECT_EQ(r.workspace, c.withData ? data : sb.defaultWorkspace());
@@ -279,7 +312,7 @@ TEST(UserAreas, BaseLocationExpandsOnlyItsFirstRcpHome) {
     ASSERT_FALSE(lines.empty());
     EXPECT_TRUE(isErrorLine(lines.back(), "RLNCH0007E: " + sb.inst() + "/base" + sb.inst() +
                                               "/macosx/x86/eclipse is not executable or does not exist."))
-        << r.log;
+        << r.describe();
 }
 
 }  // namespace

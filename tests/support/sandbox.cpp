@@ -172,6 +172,11 @@ const ChildRecord& LaunchResult::child() const {
     return children.empty() ? none : children.front();
 }
 
+std::string LaunchResult::describe() const {
+    return "\n--- terminal ---\n" + terminal + "--- /tmp/rcplauncher.log ---\n" + tmpLog +
+           "--- workspace log ---\n" + log;
+}
+
 FileState fileState(const std::string& path) {
     FileState s;
     struct stat st;

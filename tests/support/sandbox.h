@@ -73,6 +73,8 @@ struct LaunchResult {
     bool hasChild() const { return !children.empty(); }
     // The first child's record; an empty record when there was none.
     const ChildRecord& child() const;
+    // Everything a failing check should show: terminal output and both logs.
+    std::string describe() const;
 };
 
 // A file's bytes and modification time, to prove that a launch left it alone.
