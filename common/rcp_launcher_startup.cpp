@@ -57,8 +57,8 @@ void releaseEffectiveArgs(Startup& s) {
     s.cargc = 0;
 }
 
-// Steps 1 to 5: installation directory, launcher properties, effective
-// arguments, and debug output decided again on those.
+// Installation directory, launcher properties, effective arguments, and
+// debug output decided again on those.
 void readLauncherProperties(Startup& s) {
     getInstallDir(s.installDir, s.argc, s.argv);
     // A launcher outside a directory named "rcp" is reported as a lone NUL:
@@ -74,7 +74,7 @@ void readLauncherProperties(Startup& s) {
     setDebug(isDebug(s.cargc, s.cargv));
 }
 
-// Steps 6 to 8: install configuration, installation identifier, base location.
+// Install configuration, installation identifier, base location.
 void readInstallationIdentity(Startup& s) {
     SetInstallConfiguration(s.rcpLauncherPropertiesArray, false);
     const wchar_t* id = getInstallID(s.rcp_launcher_properties_file, s.rcpLauncherPropertiesArray);
@@ -90,7 +90,8 @@ void readInstallationIdentity(Startup& s) {
     if (home != wstring::npos) s.coreLocation.replace(home, wcslen(RCPHOME_REPLACE), s.installDir);
 }
 
-// Steps 9 to 12: workspace, log, platform lock, configuration area.
+// Workspace, log, platform lock, configuration area, in this order: the log
+// opens as soon as its directory exists, and the lock is held from then on.
 void prepareUserAreas(Startup& s) {
     getWorkspaceLocation(s.workspaceLocation, s.rcpLauncherPropertiesArray, s.cargc, s.cargv, s.installDir);
     ensureDirectory(s.workspaceLocation);
@@ -108,7 +109,7 @@ void prepareUserAreas(Startup& s) {
     ensureDirectory(s.configLocation);
 }
 
-// Step 13: an area left by another installation is set aside; otherwise a
+// An area left by another installation is set aside; otherwise a
 // reset happens only when the user typed "-resetconfig" (not when the
 // launcher properties add it). A first launch has nothing to reset.
 void reuseOrResetAreas(Startup& s) {
@@ -119,7 +120,7 @@ void reuseOrResetAreas(Startup& s) {
         resetWorkspace(s.workspaceLocation, s.configLocation, s.coreLocation);
 }
 
-// Steps 14 and 15: the user's own update site, and the installation's shared
+// The user's own update site, and the installation's shared
 // extension marker copied into it when the installation has one.
 void prepareUserSite(Startup& s) {
     wstring siteLocation = s.workspaceLocation + SITE_LOC;
@@ -136,7 +137,7 @@ void prepareUserSite(Startup& s) {
     if (exists(extLocation.c_str())) copyFile(extLocation.c_str(), siteLocation.c_str());
 }
 
-// Steps 16 to 18: the startup record (main process only, with the arguments
+// The startup record (main process only, with the arguments
 // as typed), config.ini, and the user's installation properties, read back.
 void prepareUserFiles(Startup& s) {
     if (isMainProcess()) writeStartupArgs(s.argc, s.argv, s.configLocation);
@@ -161,7 +162,7 @@ wstring jvmPropertiesBeside(wstring vmString) {
     return vmString.substr(0, slash + 1) + JVM_PROPERTIES;
 }
 
-// Step 19: JVM properties appended to the installation properties. Returns
+// JVM properties appended to the installation properties. Returns
 // false when a "-vm" value is too shallow to hold a jvm.properties: the launch
 // then goes on without building a command line.
 bool readJvmProperties(Startup& s) {
@@ -179,7 +180,7 @@ bool readJvmProperties(Startup& s) {
     return true;
 }
 
-// Step 22: a platform that still needs its initial configuration is started
+// A platform that still needs its initial configuration is started
 // with "-config initial" (and the user's "-data" pair, if any) instead of the
 // user's arguments.
 void switchToInitialLaunch(Startup& s) {
@@ -205,7 +206,7 @@ void switchToInitialLaunch(Startup& s) {
                                        s.rcpLauncherPropertiesArray, s.newargs);
 }
 
-// Step 24.
+// The properties arrays and the effective argument vector.
 void release(Startup& s) {
     freeProperties(s.rcpInstallPropertiesArray);
     freeProperties(s.rcpLauncherPropertiesArray);
