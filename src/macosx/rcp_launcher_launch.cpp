@@ -40,8 +40,7 @@ void setSemVersion(wchar_t* /*id*/) {}
 
 namespace {
 
-// The narrow argument vector handed to execv; it lives until the process
-// either becomes the child or ends.
+// The narrow argument vector handed to execv.
 char** buildNativeArgs(size_t& size) {
     size = launchArgs.size();
     char** cargs = new char*[size + 1];
@@ -63,7 +62,10 @@ char** buildNativeArgs(size_t& size) {
 void launchEclipse(int argc, wchar_t** wargv) {
     size_t size = 0;
     char** cargs = buildNativeArgs(size);
-    if (size == 0) return;  // nothing to start: the command line was never built
+    if (size == 0) {  // nothing to start: the command line was never built
+        delete[] cargs;
+        return;
+    }
 
     pid_t childPid = fork();
     if (childPid == 0) {
@@ -86,6 +88,8 @@ void launchEclipse(int argc, wchar_t** wargv) {
         while (waitpid(childPid, &status, 0) == -1 && errno == EINTR) {
         }
     }
+    for (size_t i = 0; i < size; ++i) delete[] cargs[i];
+    delete[] cargs;
 }
 
 int launcherMain(int argc, char** argv) {
@@ -93,6 +97,9 @@ int launcherMain(int argc, char** argv) {
 
     std::vector<wchar_t*> wargv(static_cast<size_t>(argc) + 1, nullptr);
     for (int i = 0; i < argc; ++i) wargv[static_cast<size_t>(i)] = chartowcs(argv[i]);
+    // Startup may put expanded copies in place of some entries; the copies
+    // belong to the placeholder module, the originals are released here.
+    const std::vector<wchar_t*> ownedArgs(wargv);
 
     if (haveLaunchOption("-restart", argv, argc)) bRestart = true;
     doVersionCheck(argc, wargv.data());
@@ -103,5 +110,6 @@ int launcherMain(int argc, char** argv) {
     // The JVM option that must come after everything startup put in.
     addArgToCommandLine(_JVMARG_XstartOnFirstThread, false);
     launchEclipse(argc, wargv.data());
+    for (wchar_t* a : ownedArgs) freeString(a);
     return 0;
 }
