@@ -7,6 +7,7 @@
 #include <cstdlib>
 
 #include "rcp_launcher.h"
+#include "sandbox.h"
 #include "test_util.h"
 
 using rcptest::WArgs;
@@ -69,10 +70,10 @@ TEST_F(LaunchTest, StartsTheChildWithItsArgumentsAndWaitsWhenAsked) {
     launchEclipse(args.argc(), args.argv());
     unsetenv("RCP_STUB_RECORD");
     // Waited: the record is complete as soon as launchEclipse returns.
-    std::string text = rcptest::readText(record);
-    std::string expectedArgs = std::string("ARGV\0" "4\0", 7) + RCP_STUB_CHILD + std::string("\0with blank\0line\nbreak\0-XstartOnFirstThread\0ENV\0", 48);
-    ASSERT_GE(text.size(), expectedArgs.size());
-    EXPECT_EQ(text.substr(0, expectedArgs.size()), expectedArgs);
+    rcptest::ChildRecord child;
+    ASSERT_TRUE(rcptest::parseChildRecord(rcptest::readText(record), child));
+    EXPECT_EQ(child.argv, (std::vector<std::string>{RCP_STUB_CHILD, "with blank", "line\nbreak",
+                                                    "-XstartOnFirstThread"}));
 }
 
 TEST_F(LaunchTest, ConsoleAmongTheChildArgumentsAlsoWaits) {
