@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <cstring>
 #include <cwchar>
+#include <unordered_map>
 
 #include "fuzz_common.h"
 
@@ -44,10 +45,10 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     for (String s : props) FUZZ_CHECK(s != nullptr);
 
     // The first occurrence of every key wins.
+    std::unordered_map<std::wstring, String> firstValue;
     for (size_t i = 0; i < props.size(); i += 2) {
-        size_t first = 0;
-        while (wcscmp(props[first], props[i]) != 0) first += 2;
-        FUZZ_CHECK(findProperty(props[i], props) == props[first + 1]);
+        firstValue.emplace(props[i], props[i + 1]);
+        FUZZ_CHECK(findProperty(props[i], props) == firstValue[props[i]]);
     }
 
     // The selection runs in file order up to the first empty key.
