@@ -1,23 +1,58 @@
 #!/usr/bin/env bash
-# Installs the Debian packages the build, the tests and the demo need, when
-# they are missing. Safe to run again.
+# Installs what the build, the tests and the demo need, when it is missing.
+# Safe to run again. Package names given as arguments are installed as well.
+#
+# Debian and Ubuntu: apt-get (through sudo when not run as root), including a
+# JVM, the Java compiler and Debian's Equinox launcher and framework for the
+# real-platform test and the demo. macOS: Homebrew formulae; Equinox has none,
+# so the real-platform test skips itself there.
 set -euo pipefail
 
-packages=(cmake make g++ clang libclang-rt-14-dev libgtest-dev libgmock-dev libbenchmark-dev)
+if [ "$(uname -s)" = Darwin ]; then
+  formulae="googletest google-benchmark $*"
+  command -v cmake >/dev/null || formulae="cmake $formulae"
+  missing=""
+  for f in $formulae; do
+    brew list --formula "$f" >/dev/null 2>&1 || missing="$missing $f"
+  done
+  if [ -n "$missing" ]; then
+    echo "Installing:$missing"
+    # shellcheck disable=SC2086 # one word per formula
+    brew install $missing
+  fi
+  exit 0
+fi
+
+packages=(cmake make g++ clang libgtest-dev libgmock-dev libbenchmark-dev)
+packages+=(default-jre-headless default-jdk-headless libequinox-launcher-java libeclipse-osgi-java)
 packages+=("$@")
 
-missing=()
-for p in "${packages[@]}"; do
-  if ! dpkg-query -W -f='${Status}' "$p" 2>/dev/null | grep -q "install ok installed"; then
-    missing+=("$p")
-  fi
-done
+SUDO=""
+if [ "$(id -u)" -ne 0 ]; then SUDO="sudo"; fi
+export DEBIAN_FRONTEND=noninteractive
+updated=""
 
-if [ ${#missing[@]} -gt 0 ]; then
+is_installed() {
+  dpkg-query -W -f='${Status}' "$1" 2>/dev/null | grep -q "install ok installed"
+}
+
+install_missing() {
+  local missing=() p
+  for p in "$@"; do
+    is_installed "$p" || missing+=("$p")
+  done
+  [ ${#missing[@]} -gt 0 ] || return 0
   echo "Installing: ${missing[*]}"
-  SUDO=""
-  if [ "$(id -u)" -ne 0 ]; then SUDO="sudo"; fi
-  export DEBIAN_FRONTEND=noninteractive
-  $SUDO apt-get update -qq
+  if [ -z "$updated" ]; then
+    $SUDO apt-get update -qq
+    updated=yes
+  fi
   $SUDO apt-get install -y -qq --no-install-recommends "${missing[@]}"
-fi
+}
+
+install_missing "${packages[@]}"
+
+# The sanitizer and libFuzzer runtime of the clang that "clang" installed
+# (clang-14 on Debian 12, newer on recent Ubuntu).
+clang_major=$(dpkg-query -W -f='${Depends}' clang 2>/dev/null | sed -n 's/^clang-\([0-9][0-9]*\).*/\1/p')
+install_missing "libclang-rt-${clang_major:-14}-dev"
