@@ -32,6 +32,17 @@ const size_t LOG_TEXT_LIMIT = 4096;
 // Shared target of the argument marks that say "not changed"; never freed.
 wchar_t unchangedArg[1] = {0};
 
+// Expanded arguments replace entries of an argument vector that belongs to
+// someone else and must live for the rest of the run; this pool owns them
+// and releases them at process exit.
+struct ExpandedArgPool {
+    std::vector<String> strings;
+    ~ExpandedArgPool() {
+        for (String s : strings) freeString(s);
+    }
+};
+ExpandedArgPool expandedArgs;
+
 // Replaces every occurrence of placeholder by replacement, in one pass. The
 // search goes on after the inserted text, so a path that itself contains the
 // placeholder cannot make the replacement loop.
@@ -216,6 +227,7 @@ void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wc
         if (replaceStdPlaceholders(workspaceLocation, installDir, arg)) {
             // The old argument is not freed: it belongs to whoever built argv.
             String changed = initMemString(newString(arg.length() + 1), arg.c_str());
+            expandedArgs.strings.push_back(changed);
             argv[i] = changed;
             cargv[i] = changed;
         } else {
