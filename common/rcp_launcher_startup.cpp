@@ -10,6 +10,7 @@
 //    "-config NAME" replaced by the config.NAME.N launcher properties.
 // Reset, the startup record and the initial-launch rebuild look at what the
 // user typed; everything that locates or builds looks at the effective ones.
+#include <cerrno>
 #include <cstdlib>
 #include <cwchar>
 #include <string>
@@ -24,7 +25,15 @@ bool userFirstLaunch = false;
 void ensureDirectory(const wstring& dir) {
     if (isDirectory(dir.c_str())) return;
     userFirstLaunch = true;
-    if (!mkdirs(dir.c_str())) fatalErrorA("RLNCH0010E: Unable to create %ls directory.", dir.c_str(), true);
+    if (mkdirs(dir.c_str())) return;
+    // The workspace and log directories come before the platform lock, so
+    // another launcher of the same user may have created the directory
+    // between the test above and mkdirs (whose last mkdir then fails with
+    // EEXIST). What counts is that the directory is there now.
+    const int mkdirsErrno = errno;
+    if (isDirectory(dir.c_str())) return;
+    errno = mkdirsErrno;  // the error line reports why mkdirs failed
+    fatalErrorA("RLNCH0010E: Unable to create %ls directory.", dir.c_str(), true);
 }
 
 namespace {

@@ -2,6 +2,7 @@
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <grp.h>
 #include <signal.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
@@ -11,6 +12,7 @@
 #endif
 
 #include <algorithm>
+#include <cctype>
 #include <cerrno>
 #include <chrono>
 #include <climits>
@@ -69,6 +71,37 @@ void waitGone(long pid, int timeoutSeconds) {
         }
         nap();
     }
+}
+
+// The words of RCP_LAUNCHER_WRAPPER, or none.
+std::vector<std::string> launcherWrapper() {
+    std::vector<std::string> words;
+    const char* w = getenv("RCP_LAUNCHER_WRAPPER");
+    std::string text = w ? w : "";
+    size_t i = 0;
+    while (i < text.size()) {
+        while (i < text.size() && isspace(static_cast<unsigned char>(text[i]))) i++;
+        size_t start = i;
+        while (i < text.size() && !isspace(static_cast<unsigned char>(text[i]))) i++;
+        if (i > start) words.push_back(text.substr(start, i - start));
+    }
+    return words;
+}
+
+// A program name without a slash is looked up on the test's own PATH.
+std::string findExecutable(const std::string& name) {
+    if (name.find('/') != std::string::npos) return name;
+    const char* p = getenv("PATH");
+    std::string path = p ? p : "/usr/bin:/bin";
+    size_t start = 0;
+    while (start <= path.size()) {
+        size_t end = path.find(':', start);
+        if (end == std::string::npos) end = path.size();
+        std::string candidate = (end > start ? path.substr(start, end - start) : ".") + "/" + name;
+        if (access(candidate.c_str(), X_OK) == 0) return candidate;
+        start = end + 1;
+    }
+    return name;
 }
 
 void copyExecutable(const std::string& from, const std::string& to) {
@@ -344,69 +377,117 @@ std::vector<ChildRecord> Sandbox::collectRecords(int expected, int timeoutSecond
     return records;
 }
 
-LaunchResult Sandbox::run(const RunOptions& opts) {
-    LaunchResult res;
-    res.launcherEnv = environmentFor(opts);
-    std::string program = opts.program.empty() ? launcher() : opts.program;
-    std::string terminal = path("terminal.out");
-
+void Sandbox::beginRuns() const {
     clearRecords();
     resetTmpLog();
-    unlink(terminal.c_str());
+    unlink(terminalFile().c_str());
     reapOrphans();
+}
 
-    std::vector<std::string> argStore = {program};
+pid_t Sandbox::start(const RunOptions& opts) const { return spawn(opts, -1); }
+
+std::vector<pid_t> Sandbox::startTogether(const std::vector<RunOptions>& runs) const {
+    int gate[2];
+    if (pipe(gate) != 0) throw std::runtime_error("pipe failed");
+    fcntl(gate[0], F_SETFD, FD_CLOEXEC);
+    fcntl(gate[1], F_SETFD, FD_CLOEXEC);
+    std::vector<pid_t> pids;
+    for (const auto& opts : runs) pids.push_back(spawn(opts, gate[0], gate[1]));
+    // End of file on the gate releases every launcher at once.
+    close(gate[1]);
+    close(gate[0]);
+    return pids;
+}
+
+pid_t Sandbox::spawn(const RunOptions& opts, int gateRead, int gateWrite) const {
+    const std::string program = opts.program.empty() ? launcher() : opts.program;
+    if (opts.uid >= 0 || opts.gid >= 0) {
+        // The launcher of another user must reach its program and the stub
+        // children their record files.
+        if (chmod(root_.c_str(), 01777) != 0) throw std::runtime_error("cannot open the sandbox to other users");
+    }
+
+    std::vector<std::string> argStore = launcherWrapper();
+    argStore.push_back(program);
     argStore.insert(argStore.end(), opts.args.begin(), opts.args.end());
+    const std::string executable = findExecutable(argStore.front());
     std::vector<std::string> envStore;
-    for (const auto& kv : res.launcherEnv) envStore.push_back(kv.first + "=" + kv.second);
+    for (const auto& kv : environmentFor(opts)) envStore.push_back(kv.first + "=" + kv.second);
     std::vector<char*> argv, envp;
     for (auto& a : argStore) argv.push_back(&a[0]);
     argv.push_back(nullptr);
     for (auto& e : envStore) envp.push_back(&e[0]);
     envp.push_back(nullptr);
+    const std::string terminal = terminalFile();
 
     pid_t pid = fork();
     if (pid < 0) throw std::runtime_error("fork failed");
     if (pid == 0) {
+        if (gateRead >= 0) {
+            close(gateWrite);
+            char c;
+            while (read(gateRead, &c, 1) < 0 && errno == EINTR) {
+            }
+        }
         int out = open(terminal.c_str(), O_WRONLY | O_CREAT | O_APPEND, 0644);
         int in = open("/dev/null", O_RDONLY);
         if (out < 0 || in < 0 || chdir(root_.c_str()) != 0) _exit(126);
         dup2(in, 0);
         dup2(out, 1);
         dup2(out, 2);
-        execve(program.c_str(), argv.data(), envp.data());
+        if (opts.gid >= 0 && (setgroups(0, nullptr) != 0 || setgid(static_cast<gid_t>(opts.gid)) != 0)) _exit(126);
+        if (opts.uid >= 0 && setuid(static_cast<uid_t>(opts.uid)) != 0) _exit(126);
+        execve(executable.c_str(), argv.data(), envp.data());
         _exit(127);
     }
+    return pid;
+}
 
-    auto deadline = Clock::now() + std::chrono::seconds(opts.timeoutSeconds);
+int Sandbox::waitFor(pid_t pid, int timeoutSeconds) const {
+    auto deadline = Clock::now() + std::chrono::seconds(timeoutSeconds);
     int status = 0;
     for (;;) {
         pid_t r = waitpid(pid, &status, WNOHANG);
         if (r == pid) break;
-        if (r < 0 && errno != EINTR) break;
+        if (r < 0 && errno != EINTR) return -1;
         if (Clock::now() > deadline) {
             kill(pid, SIGKILL);
             waitpid(pid, &status, 0);
-            res.timedOut = true;
-            break;
+            return -1;
         }
         nap();
     }
-    if (res.timedOut) res.status = -1;
-    else if (WIFEXITED(status)) res.status = WEXITSTATUS(status);
-    else if (WIFSIGNALED(status)) res.status = 128 + WTERMSIG(status);
+    if (WIFEXITED(status)) return WEXITSTATUS(status);
+    if (WIFSIGNALED(status)) return 128 + WTERMSIG(status);
+    return -1;
+}
 
-    int expected = opts.expectChildren >= 0 ? opts.expectChildren : (res.status == 0 ? 1 : 0);
-    res.children = collectRecords(expected, 15);
-    for (const auto& c : res.children) {
-        if (opts.keepChildren) kept_.push_back(c.pid);
+void Sandbox::releaseChildren(const std::vector<ChildRecord>& children, bool keep) {
+    for (const auto& c : children) {
+        if (keep) kept_.push_back(c.pid);
         else waitGone(c.pid, 15);
     }
     reapOrphans();
+}
+
+std::string Sandbox::terminalOutput() const { return readText(terminalFile()); }
+
+LaunchResult Sandbox::run(const RunOptions& opts) {
+    LaunchResult res;
+    res.launcherEnv = environmentFor(opts);
+
+    beginRuns();
+    pid_t pid = start(opts);
+    res.status = waitFor(pid, opts.timeoutSeconds);
+    res.timedOut = res.status == -1;
+
+    int expected = opts.expectChildren >= 0 ? opts.expectChildren : (res.status == 0 ? 1 : 0);
+    res.children = collectRecords(expected, 15);
+    releaseChildren(res.children, opts.keepChildren);
 
     res.tmpLogWritten = pathExists(kTmpLog);
     res.tmpLog = readText(kTmpLog);
-    res.terminal = readText(terminal);
+    res.terminal = terminalOutput();
     std::string data = res.child().argAfter("-data");
     res.workspace = data.empty() ? defaultWorkspace() : data;
     res.log = readText(res.workspace + "/logs/rcplauncher.log");

@@ -18,6 +18,11 @@
 // The test process becomes a subreaper (Linux) so that children the launcher
 // leaves behind are reparented to it and reaped here: a zombie still answers
 // kill(pid, 0), which would make the next launch believe a platform runs.
+//
+// When the environment variable RCP_LAUNCHER_WRAPPER is set (blank-separated
+// words, e.g. "valgrind -q --error-exitcode=99"), every launcher runs under
+// that command: the wrapper is executed with the launcher's path and
+// arguments appended (found on the test's PATH unless it holds a slash).
 #ifndef RCP_SANDBOX_H
 #define RCP_SANDBOX_H
 
@@ -57,6 +62,11 @@ struct RunOptions {
     int expectChildren = -1;                     // -1: one when the launcher exits 0, else none
     bool keepChildren = false;                   // leave the children running (RCP_STUB_SLEEP)
     int timeoutSeconds = 60;                     // for the launcher itself
+    // Run the launcher as this user and group instead of the test's own
+    // (needs root; -1: unchanged). The sandbox root is then opened to every
+    // user so that the launcher and its children can reach it.
+    int uid = -1;
+    int gid = -1;
 };
 
 struct LaunchResult {
@@ -160,8 +170,36 @@ public:
     // Ends the children left running by keepChildren runs.
     void killChildren();
 
+    // Lower-level pieces of run(), for launches that overlap or are cut
+    // short. A batch starts with beginRuns() (no records, no fallback log, no
+    // terminal output), then any number of start() calls; each started
+    // launcher is waited for with waitFor(); collectChildren() gathers the
+    // records of every child started since beginRuns().
+    void beginRuns() const;
+    // Starts the launcher as run() would, without waiting; its terminal
+    // output is appended to the batch's.
+    pid_t start(const RunOptions& opts) const;
+    // Starts one launcher per element that all begin at the same moment:
+    // each waits at a gate until the last one is forked.
+    std::vector<pid_t> startTogether(const std::vector<RunOptions>& runs) const;
+    // The launcher's exit status as in LaunchResult::status; a launcher
+    // still running after timeoutSeconds is killed and gives -1.
+    int waitFor(pid_t launcher, int timeoutSeconds = 60) const;
+    // Waits until at least `expected` records are there (at most
+    // timeoutSeconds), then returns all of them in the order they started.
+    std::vector<ChildRecord> collectChildren(int expected, int timeoutSeconds = 15) const {
+        return collectRecords(expected, timeoutSeconds);
+    }
+    // Waits for the recorded children to end, or, with keep, leaves them to
+    // killChildren() (and the destructor).
+    void releaseChildren(const std::vector<ChildRecord>& children, bool keep);
+    // Everything the launchers of the batch wrote to the terminal.
+    std::string terminalOutput() const;
+
 private:
     std::map<std::string, std::string> environmentFor(const RunOptions& opts) const;
+    std::string terminalFile() const { return root_ + "/terminal.out"; }
+    pid_t spawn(const RunOptions& opts, int gateRead, int gateWrite = -1) const;
     void clearRecords() const;
     std::vector<ChildRecord> collectRecords(int expected, int timeoutSeconds) const;
 
