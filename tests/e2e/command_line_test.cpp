@@ -2,6 +2,7 @@
 // install configuration that a launch can be in, and how the launcher
 // properties ('-config NAME' extensions) change the effective arguments.
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include "sandbox.h"
 #include "test_util.h"
@@ -190,6 +191,161 @@ TEST(CommandLine, DebugOutputFromTheEffectiveArguments) {
         EXPECT_EQ(r.child().argIndex("-debug") != -1, c.debug);
         EXPECT_EQ(r.terminal, "");
     }
+}
+
+}  // namespace
+
+namespace {
+
+// Terminal output that the child's dynamic loader may write about a preload
+// library that cannot be loaded: the launcher itself must write nothing.
+std::string withoutLoaderWarnings(const std::string& terminal) {
+    std::string kept;
+    for (const std::string& line : splitLines(terminal))
+        if (!line.empty() && line.find("from LD_PRELOAD cannot be preloaded") == std::string::npos) kept += line + "\n";
+    return kept;
+}
+
+// Every input that the builders read, for each install configuration: the
+// launcher's own options (passed on, held back or overriding a property),
+// the properties behind each VM argument, system property and -X option, the
+// jvm.properties beside an overriding JVM, and the environment keys. The
+// child gets exactly this command line and environment.
+TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
+    const std::string launcherExtra =
+        "osgi.splashPath=platform:/base/plugins/splash\n"
+        "product=launcher.product\n";
+    const std::string installExtra =
+        "product=install.product\n"
+        "personality=pers.one\n"
+        "plugincustomization=prop.ini\n"
+        "vmfix.noconsole=-Dfix=${workspace.location}\\\\fix\n"
+        "vmfix.noconsole.2=-Dfix.second=1\n"
+        "vmarg.b=-Dvb=2\n"
+        "vmarg.a=\n"
+        "vmarg.0=-Dvzero=0\n"
+        "-Dempty=\n"
+        "-Xss=2m\n"
+        "Xbootclasspath.prepend=${rcp.home}/pre.jar\n"
+        "Xbootclasspath.append=/post.jar\n"
+        "library.path.prepend=${rcp.home}/lib\n"
+        "library.path.append=/opt/append/lib\n"
+        "env.setXRCP_COUNTED=yes\n"
+        "env.JAVA_HIGH_ZIPFDS=900\n"
+        "library.preload=/nonexistent/libpre.so\n";
+    for (const std::string configuration : {"user", "lockdown", "serial.multiuser", "multiuser", "userpb", "service"}) {
+        SCOPED_TRACE("install.configuration=" + configuration);
+        const bool isService = configuration == "service";
+        Sandbox sb;
+        sb.setupInstall(configuration, launcherExtra, installExtra);
+        // An overriding JVM three levels below a jvm.properties of its own.
+        const std::string jvm2 = sb.path("inst/jvm2/jre/bin/java");
+        sb.installStub(jvm2);
+        sb.writeFile("inst/jvm2/jvm.properties", "-Dfrom.jvm=1\nvmarg.z=-Dvz=1\n");
+
+        RunOptions o = userRun({"-consoleLog", "-plugincustomization", "cmd.ini", "-resetconfig", "-foo", "-vm", jvm2,
+                                "-vmargs", "-Duser.vm=1"});
+        LaunchResult r = sb.run(o);
+        ASSERT_EQ(r.status, 0) << r.describe();
+        ASSERT_EQ(r.children.size(), 1u);
+
+        const std::string ws = isService ? sb.inst() + "/eclipse/.workspace" : sb.defaultWorkspace();
+        const std::string cfg = isService ? sb.inst() + "/eclipse/.config" : sb.defaultConfig();
+        const std::vector<std::string> platform = {
+            "-consoleLog", "-plugincustomization", "cmd.ini", "-foo", "-data", ws, "-configuration", cfg,
+            "-application", "com.kel.demo.app", "-product", "launcher.product", "-personality", "pers.one"};
+        const std::vector<std::string> vm = {
+            "-Duser.vm=1", "-Dfix=" + ws + "/fix", "-Dvmarg.one=1", "-Dvb=2", "-Dvzero=0", "-Dvz=1",
+            "-Drcp.home=" + sb.inst(), "-Drcp.data=" + ws, "-Dosgi.splashPath=platform:/base/plugins/splash",
+            "-Dcom.kel.rcp.install.id=ID42", "-Drcp.install.config=" + configuration, "-Dbase.prop=one", "-Dempty=",
+            "-Dfrom.jvm=1", "-Drcp.osgi.install.area=" + sb.inst() + (isService ? "/eclipse" : "/rcp/eclipse"),
+            "-Xmx256m", "-Xss=2m", "-Xbootclasspath/p:" + sb.inst() + "/pre.jar", "-Xbootclasspath/a:/post.jar",
+            "-cp", sb.inst() + "/lib/boot.jar"};
+        std::vector<std::string> expected;
+        auto append = [&](const std::vector<std::string>& v) { expected.insert(expected.end(), v.begin(), v.end()); };
+        if (isService) {
+            append({jvm2});
+            append(vm);
+            append({"org.eclipse.core.launcher.Main", "-nosplash"});
+            append(platform);
+        } else {
+            append({sb.eclipse()});
+            append(platform);
+            append({"-vm", jvm2, "-startup", sb.base() + "/launcher.jar", "-vmargs"});
+            append(vm);
+        }
+        append({"-XstartOnFirstThread"});
+        EXPECT_EQ(r.child().argv, expected);
+
+        std::map<std::string, std::string> env = r.launcherEnv;
+        env.erase("JAVA_HOME");
+        env["JAVA_HIGH_ZIPFDS"] = "900";
+        env["RCP_DEMO"] = "hello world";
+        env["RCP_COUNTED"] = "yes";  // "env.setX..." loses its first 8 characters, the X included
+        env["LD_LIBRARY_PATH"] = sb.inst() + "/lib:/opt/inherited/lib:/opt/append/lib";
+        env["LD_PRELOAD"] = "/nonexistent/libpre.so";
+        EXPECT_EQ(r.child().env, env);
+        EXPECT_EQ(withoutLoaderWarnings(r.terminal), "");
+    }
+}
+
+// The console options and a restart: "-console" keeps the console fix away
+// from the JVM and reaches the platform; a restart brings the fix back and
+// keeps "-console" and "-debug" away from the child. Without any library path
+// key the inherited LD_LIBRARY_PATH reaches the child unchanged, and with the
+// preload library behind a path with a blank the child is given a link of
+// its own under /tmp.
+TEST(CommandLine, ConsoleRestartAndPreloadLink) {
+    Sandbox sb;
+    const std::string lib = sb.path("my libs/libpre." + std::to_string(getpid()) + ".so");
+    sb.writeFile(lib, "");
+    const std::string link = "/tmp/kel.rcp.tester.ID42.libpre." + std::to_string(getpid()) + ".so";
+    unlink(link.c_str());
+    sb.setupInstall("user", "", "vmfix.noconsole=-Dfix=1\nlibrary.preload=" + lib + "\n");
+    struct Case {
+        std::vector<std::string> args;
+        bool fix;
+        std::vector<std::string> passed;  // launcher arguments the platform gets
+    };
+    const std::vector<Case> cases = {
+        {{"-console", "-debug"}, false, {"-console", "-debug"}},
+        {{"-console", "-debug", "-restart"}, true, {}},
+        {{"-consoleLog"}, true, {"-consoleLog"}},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(::testing::PrintToString(c.args));
+        RunOptions o;
+        o.args = c.args;
+        o.env = {{"LD_LIBRARY_PATH", "/opt/inherited/lib"}};
+        LaunchResult r = sb.run(o);
+        ASSERT_EQ(r.status, 0) << r.describe();
+        const ChildRecord& child = r.child();
+        std::vector<std::string> expected = {sb.eclipse()};
+        expected.insert(expected.end(), c.passed.begin(), c.passed.end());
+        const std::string ws = sb.defaultWorkspace();
+        for (const std::string& a : {std::string("-data"), ws, std::string("-configuration"), sb.defaultConfig(),
+                                     std::string("-application"), std::string("com.kel.demo.app"),
+                                     std::string("-vm"), sb.jvm(), std::string("-startup"),
+                                     sb.base() + "/launcher.jar", std::string("-vmargs")})
+            expected.push_back(a);
+        if (c.fix) expected.push_back("-Dfix=1");
+        for (const std::string& a :
+             {std::string("-Dvmarg.one=1"), "-Drcp.home=" + sb.inst(), "-Drcp.data=" + ws,
+              std::string("-Dcom.kel.rcp.install.id=ID42"), std::string("-Drcp.install.config=user"),
+              std::string("-Dbase.prop=one"), "-Drcp.osgi.install.area=" + sb.inst() + "/rcp/eclipse",
+              std::string("-Xmx256m"), std::string("-cp"), sb.inst() + "/lib/boot.jar",
+              std::string("-XstartOnFirstThread")})
+            expected.push_back(a);
+        EXPECT_EQ(child.argv, expected);
+        auto env = [&](const char* name) { return child.hasEnv(name) ? child.env.at(name) : "<unset>"; };
+        EXPECT_EQ(env("LD_LIBRARY_PATH"), "/opt/inherited/lib");
+        EXPECT_EQ(env("LD_PRELOAD"), link);
+        char target[4096];
+        ssize_t n = readlink(link.c_str(), target, sizeof target);
+        EXPECT_EQ(n < 0 ? "<no link>" : std::string(target, static_cast<size_t>(n)), lib);
+        EXPECT_EQ(withoutLoaderWarnings(r.terminal), "");
+    }
+    unlink(link.c_str());
 }
 
 }  // namespace
