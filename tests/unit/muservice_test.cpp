@@ -1,8 +1,10 @@
 // The order in which the child's command line is assembled for each kind of
 // launch, the shared-classes clean-up, and the multi-user service's area.
 #include <gtest/gtest.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
+#include <climits>
 #include <cstdlib>
 
 #include "cmd_test_support.h"
@@ -43,6 +45,7 @@ protected:
 
 TEST_F(MuServiceTest, EachKindOfLaunchHasItsOwnOrder) {
     const std::wstring eclipse = base_ + L"/macosx/x86/eclipse", svcWs = inst_ + L"/eclipse/.workspace";
+    const std::wstring muWs = inst_ + L"/eclipse/.muservice";
     auto dashD = [&](const std::wstring& ws, const wchar_t* cfg) {
         return Args{L"-Drcp.home=" + inst_, L"-Drcp.data=" + ws, L"-Dcom.kel.rcp.install.id=ID",
                     std::wstring(L"-Drcp.install.config=") + cfg, L"-Drcp.osgi.install.area=" + inst_ + L"/rcp/eclipse",
@@ -77,6 +80,13 @@ TEST_F(MuServiceTest, EachKindOfLaunchHasItsOwnOrder) {
         {user, false, true, false,
          cat({{eclipse}, platform, {L"-application", L"prov", L"-vm", L"/jvm/java"}, startup,
               dashD(L"/ws", L"user")})},
+        // The service's JVM boots from the base plug-in's startup.jar in the
+        // service's own area, whatever "cp" says.
+        {multiuser_service, true, false, false,
+         {L"/jvm/java", L"-Dva=1", L"-Drcp.home=" + inst_, L"-Drcp.data=" + muWs, L"-Dcom.kel.rcp.install.id=ID",
+          L"-Drcp.install.config=multiuser", L"-Drcp.osgi.install.area=" + inst_ + L"/rcp/eclipse", L"-cp",
+          base_ + L"/startup.jar", L"org.eclipse.core.launcher.Main", L"-nosplash", L"-x", L"-console", L"-data",
+          muWs, L"-configuration", muWs + L"/.config", L"-application", L"app"}},
     };
     for (const Case& c : cases) {
         cmdtest::resetCommandState(c.cfg, c.mainProcess);
@@ -175,6 +185,83 @@ TEST_F(MuServiceTest, ServiceAreaIsPreparedOnlyByTheSuperuserOrTheService) {
     std::wstring ws;
     EXPECT_FATAL_IN(dir_, unsetenv("USER"); createMUServiceWkspc(ws, inst_, none, launcher.v(), 1, args.argv()),
                     "RLNCH0006E: Couldn't find the user name!");
+}
+
+// The service start needs its launcher in the service layout: this program
+// copies itself there and runs the copy, which starts the service from this
+// environment instead of running tests and writes down the command line and
+// the environment variables it built.
+const char* const SERVICE_PROBE_OUT = "RCP_MUSERVICE_PROBE_OUT";
+
+class ServiceStartProbe : public ::testing::Environment {
+public:
+    void SetUp() override {
+        const char* out = getenv(SERVICE_PROBE_OUT);
+        if (out == nullptr) return;
+        cmdtest::resetCommandState(undefined, true);
+        enableLogging(rcptest::widen(std::string(out) + ".log"));
+        unsetenv("JAVA_HIGH_ZIPFDS");
+        WArgs args{L"probe", L"-x"};
+        startupMUService(args.argc(), args.argv());
+        std::string text;
+        for (const std::wstring& a : launchArgs) text += rcptest::narrow(a) + "\n";
+        for (const char* name : {"SVC_ENV", "JAVA_HIGH_ZIPFDS"}) {
+            const char* value = getenv(name);
+            text += std::string(name) + "=" + (value != nullptr ? value : "<unset>") + "\n";
+        }
+        rcptest::writeText(out, text);
+        _exit(eConfig == multiuser_service ? 0 : 3);
+    }
+};
+const ::testing::Environment* const serviceProbe = ::testing::AddGlobalTestEnvironment(new ServiceStartProbe);
+
+TEST(MuServiceStart, ServiceIsStartedFromItsOwnAreaInTheServiceLayout) {
+    TempDir dir;
+    char* resolved = realpath(dir.path().c_str(), nullptr);
+    ASSERT_NE(resolved, nullptr);
+    const std::string inst = resolved;
+    free(resolved);
+    // The service directory is two levels, the installation six levels above
+    // the launcher's directory.
+    const std::string svc = inst + "/p1/p2/p3/svc", probe = svc + "/b1/b2/probe";
+    std::string self;
+    read_executable_path(self);
+    rcptest::writeText(probe, rcptest::readText(self), 0755);
+    rcptest::writeText(svc + "/rcp/rcplauncher.properties",
+                       "rcp.install.id=SVC1\nrcp.base.location=${rcp.home}/base\njvm.location=/jvm/java\n"
+                       "install.configuration=lockdown\n");
+    rcptest::writeText(inst + "/base/rcpinstall.properties",
+                       "application=svc.app\ncp=/ignored.jar\n-Dsvc=1\nenv.set.SVC_ENV=on\n");
+    rcptest::writeText(inst + "/base/config.ini", "osgi.bundles=x\n");
+    rcptest::writeText(inst + "/base/platform.xml", "<config/>\n");
+
+    const std::string out = dir.sub("answer");
+    pid_t child = fork();
+    if (child == 0) {
+        setenv(SERVICE_PROBE_OUT, out.c_str(), 1);
+        if (freopen("/dev/null", "w", stdout) == nullptr || freopen("/dev/null", "w", stderr) == nullptr) _exit(126);
+        execl(probe.c_str(), probe.c_str(), "--gtest_filter=MuServiceStart.*", static_cast<char*>(nullptr));
+        _exit(127);
+    }
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    ASSERT_TRUE(WIFEXITED(status));
+    EXPECT_EQ(WEXITSTATUS(status), 0) << rcptest::readText(out + ".log");
+
+    const std::string ws = inst + "/eclipse/.muservice";
+    const std::vector<std::string> expected = {
+        "/jvm/java", "-Drcp.home=" + inst, "-Drcp.data=" + ws, "-Dcom.kel.rcp.install.id=SVC1",
+        "-Drcp.install.config=multiuser", "-Dsvc=1", "-Drcp.osgi.install.area=" + inst + "/eclipse", "-cp",
+        inst + "/base/startup.jar", "org.eclipse.core.launcher.Main", "-nosplash", "-x", "-data", ws,
+        "-configuration", ws + "/.config", "-application", "svc.app", "SVC_ENV=on", "JAVA_HIGH_ZIPFDS=500"};
+    std::vector<std::string> lines;
+    std::string answer = rcptest::readText(out);
+    for (size_t from = 0, nl; (nl = answer.find('\n', from)) != std::string::npos; from = nl + 1)
+        lines.push_back(answer.substr(from, nl - from));
+    EXPECT_EQ(lines, expected) << rcptest::readText(out + ".log");
+    // The service's own installation properties, with the computed block.
+    EXPECT_NE(rcptest::readText(ws + "/.config/rcpinstall.properties").find("vm=/jvm/java\n"), std::string::npos);
+    EXPECT_TRUE(rcptest::pathExists(ws + "/.config/config.ini"));
 }
 
 }  // namespace
