@@ -26,13 +26,19 @@ bool addConfigExtentionsToArg(int* cargc, wchar_t*** cargv, int argc, wchar_t** 
     // cargv will point into newargs, so it must hold exactly this call's list.
     newargs.clear();
     int vmargsIDX = -1;
+    // Whether the arguments hold "-vmargs" at all: vmargsIDX can be -1 (or
+    // less) for a "-vmargs" near the start, so it cannot tell.
+    bool vmargsInArgv = false;
     for (int i = 0; i < argc; ++i) {
         if (i == configOptionIDX || i == configOptionIDX + 1) continue;
         const wchar_t* arg = argv[i] != nullptr ? argv[i] : L"";
         newargs.push_back(arg);
         // The position in argv minus the two skipped words: right when
         // "-config NAME" came before "-vmargs", two places too early otherwise.
-        if (wcscmp(arg, VMARGS) == 0) vmargsIDX = i - 2;
+        if (wcscmp(arg, VMARGS) == 0) {
+            vmargsIDX = i - 2;
+            vmargsInArgv = true;
+        }
     }
 
     bool bvmargsFound = false;
@@ -42,7 +48,7 @@ bool addConfigExtentionsToArg(int* cargc, wchar_t*** cargv, int argc, wchar_t** 
         if (configExt == nullptr) break;
         if (configExt[0] == 0) continue;  // empty entries keep the numbering going
 
-        if (vmargsIDX == -1) {
+        if (!vmargsInArgv) {
             newargs.push_back(configExt);
         } else if (wcscmp(configExt, VMARGS) == 0) {
             bvmargsFound = true;  // what follows belongs after the own VM arguments

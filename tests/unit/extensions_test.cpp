@@ -23,7 +23,12 @@ TEST(ExtensionsTest, MergesConfiguredArguments) {
         // "-config" after "-vmargs": the insertion point is two places early
         {{L"p", L"a", L"b", L"-vmargs", L"v", L"-config", L"x"}, {L"-foo"}, {L"p", L"-foo", L"a", L"b", L"-vmargs", L"v"}},
         {{L"p", L"a", L"-vmargs", L"-config", L"x"}, {L"-foo"}, {L"-foo", L"p", L"a", L"-vmargs"}},
-        {{L"p", L"-vmargs", L"-config", L"x"}, {L"-foo"}, {L"p", L"-vmargs", L"-foo"}},
+        // "-vmargs" right after the program: the insertion point would lie
+        // before the start and is taken as the start
+        {{L"p", L"-vmargs", L"-config", L"x"}, {L"-foo"}, {L"-foo", L"p", L"-vmargs"}},
+        // the command line has its own "-vmargs", so the extension's "-vmargs"
+        // word is never added, wherever the command line's stands
+        {{L"p", L"-vmargs", L"v", L"-config", L"x"}, {L"-vmargs", L"-Xmx1g"}, {L"p", L"-vmargs", L"v", L"-Xmx1g"}},
         // the second option word goes, its value stays; "-personality" is removed twice
         {{L"p", L"-data", L"d1", L"-config", L"x"}, {L"-data", L"d2", L"-nl", L"de"}, {L"p", L"-data", L"d1", L"d2", L"-nl", L"de"}},
         {{L"p", L"-personality", L"1", L"-config", L"x"}, {L"-personality", L"2", L"-personality", L"3", L"-vm", L"-vm", L"-vm"},
