@@ -3,6 +3,7 @@
 // order, wait for it, release the lock and exit without starting the
 // platform; an unchanged level starts the platform as usual.
 #include <gtest/gtest.h>
+#include <signal.h>
 #include <unistd.h>
 
 #include "sandbox.h"
@@ -55,10 +56,16 @@ TEST(Provisioning, LaunchSequence) {
         const bool serviceArea = superuser && configuration != "user";
 
         // A user's first launch provisions; the level recorded by nobody yet
-        // is new, so the shared classes go too.
-        LaunchResult first = sb.run({"-foo", "-debug"});
+        // is new, so the shared classes go too. The launcher waits for its
+        // provisioning child: when it has ended, the child is gone as well.
+        RunOptions firstRun;
+        firstRun.args = {"-foo", "-debug"};
+        firstRun.env = {{"RCP_STUB_SLEEP", "1"}};
+        firstRun.keepChildren = true;
+        LaunchResult first = sb.run(firstRun);
         ASSERT_EQ(first.status, 0) << first.describe();
         ASSERT_EQ(first.children.size(), 1u);
+        EXPECT_EQ(kill(static_cast<pid_t>(first.child().pid), 0), -1);
         EXPECT_EQ(first.child().argv, provisioningArgs(sb, configuration, {"-foo", "-debug"}, true, sb.inst() + "/rcp/eclipse"));
         EXPECT_EQ(readText(lock), "");
         EXPECT_TRUE(isDir(shared));
