@@ -1,5 +1,6 @@
-// Launch sequences that span more than one launcher run: a platform that
-// asks to be restarted while it is still going down (or never goes down).
+// How launches follow one another: whether a launcher stays until its
+// platform ends, and a platform that asks to be restarted while it is still
+// going down (or never goes down).
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/types.h>
@@ -57,6 +58,44 @@ std::string lockAfter(long pid, bool invalidated) {
     std::string text = std::to_string(pid) + std::string(10, ' ');
     if (invalidated && text.size() < 14) text.resize(14, ' ');
     return text;
+}
+
+// The launcher stays until its platform ends only when it was given
+// "-rcpLauncherWait" or when the platform's own command line holds
+// "-console" (also when that comes from the launcher properties); it then
+// exits 0 whatever the platform's status. Otherwise it leaves at once.
+TEST(Sequences, LauncherWaitsForThePlatformOnlyWhenAsked) {
+    struct Case {
+        std::vector<std::string> args;
+        bool waits;
+    };
+    const std::vector<Case> cases = {
+        {{"-foo"}, false},
+        {{"-console"}, true},
+        {{"-rcpLauncherWait"}, true},
+        {{"-config", "dbg"}, true},  // config.dbg.1=-console
+        {{"-restart", "-console"}, false},
+        {{"-restart", "-rcpLauncherWait"}, true},
+    };
+    Sandbox sb;
+    sb.setupInstall("user", "config.dbg.1=-console\n");
+    for (const Case& c : cases) {
+        SCOPED_TRACE(::testing::PrintToString(c.args));
+        RunOptions o;
+        o.args = c.args;
+        o.env = {{"RCP_STUB_SLEEP", "3"}, {"RCP_STUB_EXIT", "7"}};
+        o.keepChildren = true;
+        const auto start = Clock::now();
+        LaunchResult r = sb.run(o);
+        const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(Clock::now() - start).count();
+        ASSERT_EQ(r.status, 0) << r.describe();
+        ASSERT_EQ(r.children.size(), 1u);
+        // A launcher that waited has also reaped its platform.
+        const bool platformGone = kill(static_cast<pid_t>(r.child().pid), 0) == -1 && errno == ESRCH;
+        EXPECT_EQ(platformGone, c.waits);
+        EXPECT_EQ(seconds >= 3, c.waits) << seconds << " s";
+        sb.killChildren();
+    }
 }
 
 // The platform asks for a restart by starting a new launcher with
