@@ -125,8 +125,12 @@ bool replaceAllPlaceholders(const wstring& workspaceLocation, const wstring& ins
                             wstring& placeholderString, std::vector<String>& rcpInstallPropertiesArray);
 void replacePlaceholdersInRcpInstallProp(wstring workspaceLocation, wstring installDir,
                                          std::vector<String>& rcpInstallPropertiesArray);
+// Changed entries of argv (and cargv) point to expanded copies that live until
+// the process ends or releaseExpandedArgs is called.
 void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wchar_t** argv, wchar_t** cargv,
                                int argc);
+// Frees the expanded copies; no argument vector may point to them afterwards.
+void releaseExpandedArgs();
 
 // ===================== Install configuration (rcp_launcher_installcfg) =======
 bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArray, bool muservice);

@@ -37,9 +37,11 @@ wchar_t unchangedArg[1] = {0};
 // and releases them at process exit.
 struct ExpandedArgPool {
     std::vector<String> strings;
-    ~ExpandedArgPool() {
+    void release() {
         for (String s : strings) freeString(s);
+        strings.clear();
     }
+    ~ExpandedArgPool() { release(); }
 };
 ExpandedArgPool expandedArgs;
 
@@ -235,3 +237,5 @@ void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wc
         }
     }
 }
+
+void releaseExpandedArgs() { expandedArgs.release(); }

@@ -133,12 +133,12 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         if (argv[i] != &words[i][0]) {
             // changed (the result may be empty when a path was)
             FUZZ_CHECK(cargv[i] == argv[i]);
-            free(argv[i]);
         } else {
             FUZZ_CHECK(cargv[i][0] == 0);
         }
     }
 
+    releaseExpandedArgs();
     rcpfuzz::resetLog(false);
     return 0;
 }
