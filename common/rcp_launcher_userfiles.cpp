@@ -11,6 +11,13 @@
 namespace {
 
 constexpr const wchar_t* WORK_FILE_SUFFIX = L".new";
+// The plain copy of the base file while the per-user file is being made.
+constexpr const wchar_t* BASE_COPY_SUFFIX = L".base";
+
+// The launcher properties without which the per-user file cannot be
+// completed (RLNCH0008E).
+constexpr const wchar_t* REQUIRED_LAUNCHER_VALUES[] = {RCP_INSTALL_ID_PROPERTY, JVM_LOCATION, RCP_BASE_LOC_PROPERTY,
+                                                        CONFIGURATION_PROPERTY};
 constexpr const wchar_t* FEATURE_LINE = L"<feature>";
 
 // At most 2024 bytes of a line; the trailing "\n" swallows the line end and
@@ -67,25 +74,35 @@ wstring createRCPInstallProps(const wstring& workspaceLocation, const wstring& c
     convertToOsSeparator(propPath);
     if (exists(propPath.c_str())) return propPath;
 
+    // The plain copy is made under a name of its own and only the finished
+    // file is renamed to the per-user name, so that name never holds a file
+    // without the computed values: a launch killed half-way leaves work files
+    // that the next launch makes again, not a copy that every later launch
+    // would keep and fail on (no base location, no JVM).
     const wstring basePath = getCoreFileLocation(baseLocation, INSTALL_PROPS);
-    if (!copyFile(basePath.c_str(), propPath.c_str())) {
+    const wstring copyPath = propPath + BASE_COPY_SUFFIX;
+    if (!copyFile(basePath.c_str(), copyPath.c_str())) {
         fatalErrorA("RLNCH0022E: Unable to copy rcpinstall.properties to the user directory.", true);
         return propPath;
     }
 
-    wstring newPropPath = propPath + WORK_FILE_SUFFIX;
-    fixUserRCPInstallProperties(workspaceLocation, propPath, newPropPath, installDir, propsArray);
+    // Without the required values the launch ends while the copy is
+    // completed; the plain copy is then meant to stay under the per-user
+    // name, as the administrator's evidence, and is kept by later launches.
+    bool complete = true;
+    for (const wchar_t* key : REQUIRED_LAUNCHER_VALUES)
+        if (findProperty(key, propsArray) == nullptr) complete = false;
+    wstring inPath = complete ? copyPath : propPath;
+    if (!complete) moveFile(copyPath.c_str(), propPath.c_str());
 
-    // The finished work file replaces the plain copy by one rename, which
-    // swaps the file atomically: at no moment is the per-user file missing
-    // while a finished work file exists, and a crash leaves either the old
-    // or the new content. Deleting the copy first and renaming afterwards
-    // gives the same end state, but with a window in which neither name
-    // holds the finished file. Only when the rename fails is the plain copy
-    // deleted, so that no copy without the computed values survives: the
-    // read that follows then fails and the next launch builds the file
-    // again from the base copy.
-    if (!moveFile(newPropPath.c_str(), propPath.c_str())) deleteFile(propPath.c_str());
+    wstring newPropPath = propPath + WORK_FILE_SUFFIX;
+    const int fixed = fixUserRCPInstallProperties(workspaceLocation, inPath, newPropPath, installDir, propsArray);
+    deleteFile(copyPath.c_str());
+
+    // One rename puts the finished file in place. When the work file could
+    // not be written or renamed, no per-user file is left: the read that
+    // follows then fails and the next launch builds the file again.
+    if (fixed != 0 || !moveFile(newPropPath.c_str(), propPath.c_str())) deleteFile(propPath.c_str());
 
     userFirstLaunch = true;
     return propPath;
@@ -180,8 +197,16 @@ void createConfigIni(const wstring& configLocation, const wstring& baseLocation)
     convertToOsSeparator(target);
     if (exists(target.c_str())) return;
 
+    // Copied under a work name and renamed into place: a launch killed
+    // during the copy must not leave a cut file that later launches keep.
     const wstring basePath = getCoreFileLocation(baseLocation, CONFIG_INI);
-    if (!copyFile(basePath.c_str(), target.c_str())) {
+    const wstring work = target + WORK_FILE_SUFFIX;
+    if (!copyFile(basePath.c_str(), work.c_str())) {
+        fatalErrorA("RLNCH0009E: Unable to copy config.ini to the user directory.", true);
+        return;
+    }
+    if (!moveFile(work.c_str(), target.c_str())) {
+        deleteFile(work.c_str());
         fatalErrorA("RLNCH0009E: Unable to copy config.ini to the user directory.", true);
         return;
     }
@@ -218,8 +243,11 @@ int createPlatformXML(const wstring& configLocation, const wstring& baseLocation
         SvcDebugOutW(L"RLNCH0104E: Unable to open platform.xml.\"%s\"", basePath.c_str());
         return -1;
     }
+    // Written under a work name and renamed into place once complete, so that
+    // a launch killed half-way leaves no cut file for later launches to keep.
+    const wstring work = target + WORK_FILE_SUFFIX;
     FILE* out = nullptr;
-    open_wfile(out, target.c_str(), L"w");
+    open_wfile(out, work.c_str(), L"w");
     if (out == nullptr) {
         SvcDebugOutW(L"RLNCH0105E: Unable to open platform.xml for writing.\"%s\"", target.c_str());
         fclose(in);
@@ -241,6 +269,11 @@ int createPlatformXML(const wstring& configLocation, const wstring& baseLocation
     }
     fclose(in);
     fclose(out);
+    if (!moveFile(work.c_str(), target.c_str())) {
+        SvcDebugOutW(L"RLNCH0105E: Unable to open platform.xml for writing.\"%s\"", target.c_str());
+        deleteFile(work.c_str());
+        return -1;
+    }
     userFirstLaunch = true;
     return 0;
 }

@@ -1,0 +1,386 @@
+// Launches that meet a broken or hostile file system: areas that cannot be
+// written, a read-only launcher properties file that must be appended to, a
+// reset whose backup cannot be made, a full disk, and launchers killed at
+// random moments of a first launch. Each must end with its message and
+// status, never a crash or a hang, and must not lose a file that was there.
+//
+// The tests run as root, for whom permission bits mean nothing. What can be
+// simulated without privileges is simulated with the file system's own
+// shapes: a regular file where a directory is expected, a path through a
+// file, a directory where a file is expected, a link to /dev/full for a full
+// disk. Where only permissions can do it (an unwritable home, a read-only
+// properties file), the launcher runs as the user "nobody" (the sandbox
+// drops privileges in the forked child); those cases are skipped when the
+// tests do not run as root. Not simulated: a rename across file systems and
+// a directory that even root cannot remove (both need mounts or immutable
+// attributes).
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <chrono>
+#include <cstring>
+#include <functional>
+#include <map>
+#include <random>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "sandbox.h"
+#include "test_util.h"
+
+using namespace rcptest;
+
+namespace {
+
+const int kNobody = 65534;
+
+std::string errorLine(const std::string& message, int err) { return message + " : " + strerror(err); }
+
+std::string lastLine(const std::string& log) {
+    std::vector<std::string> lines = logLines(log);
+    return lines.empty() ? "" : lines.back();
+}
+
+// Hands a tree (its root included) to another owner, links included.
+void chownTree(const std::string& root, int uid) {
+    ASSERT_EQ(lchown(root.c_str(), static_cast<uid_t>(uid), static_cast<gid_t>(uid)), 0) << root;
+    for (const auto& rel : listTree(root)) {
+        std::string p = root + "/" + rel;
+        if (!rel.empty() && rel.back() == '/') p.pop_back();
+        ASSERT_EQ(lchown(p.c_str(), static_cast<uid_t>(uid), static_cast<gid_t>(uid)), 0) << p;
+    }
+}
+
+// The regular files below root with their bytes and times, except the log
+// and the lock file, which every launch rewrites by design.
+std::map<std::string, FileState> userFiles(const std::string& root) {
+    std::map<std::string, FileState> files;
+    for (const auto& rel : listTree(root)) {
+        struct stat st;
+        // Only regular files: a link to a device (/dev/full) reads forever.
+        if (lstat((root + "/" + rel).c_str(), &st) != 0 || !S_ISREG(st.st_mode)) continue;
+        if (rel.find("logs/rcplauncher.log") != std::string::npos || rel.find(".rcp.lock") != std::string::npos)
+            continue;
+        files[rel] = fileState(root + "/" + rel);
+    }
+    return files;
+}
+
+void expectKept(const std::map<std::string, FileState>& before, const std::string& root) {
+    for (const auto& f : before) EXPECT_TRUE(fileState(root + "/" + f.first) == f.second) << "changed or lost: " << f.first;
+}
+
+// A broken area, the launch that meets it, and the line it must end with.
+struct Fault {
+    const char* name;
+    bool asNobody;   // needs a user for whom permissions count
+    bool inTmpLog;   // the launch ends before its log directory is known
+    std::function<void(Sandbox&, RunOptions&)> prepare;
+    std::function<std::string(const Sandbox&)> message;
+    int err;         // the errno the error line reports
+};
+
+TEST(Faults, UnwritableAreasEndWithTheirMessage) {
+    const std::vector<Fault> faults = {
+        {"home is a regular file", false, true,
+         [](Sandbox& sb, RunOptions&) {
+             removeTree(sb.home());
+             writeText(sb.home(), "not a directory\n");
+         },
+         [](const Sandbox& sb) { return "RLNCH0010E: Unable to create " + sb.defaultWorkspace() + " directory."; },
+         ENOTDIR},
+        {"home lies below a regular file", false, true,
+         [](Sandbox& sb, RunOptions& o) {
+             sb.writeFile("file", "x\n");
+             o.env["HOME"] = sb.path("file/home");
+         },
+         [](const Sandbox& sb) {
+             return "RLNCH0010E: Unable to create " + sb.path("file/home/KEL/RCP/ID42/tester") + " directory.";
+         },
+         ENOTDIR},
+        // mkdirs reports its last level: the levels below the refused one
+        // are missing.
+        {"home not writable by the user", true, true, [](Sandbox&, RunOptions&) {},
+         [](const Sandbox& sb) { return "RLNCH0010E: Unable to create " + sb.defaultWorkspace() + " directory."; },
+         ENOENT},
+        {"workspace is a regular file", false, true,
+         [](Sandbox& sb, RunOptions& o) {
+             sb.writeFile("wsfile", "user data\n");
+             o.args = {"-data", sb.path("wsfile")};
+         },
+         [](const Sandbox& sb) { return "RLNCH0010E: Unable to create " + sb.path("wsfile") + " directory."; },
+         EEXIST},
+        {"log directory is a regular file", false, true,
+         [](Sandbox& sb, RunOptions&) { writeText(sb.defaultWorkspace() + "/logs", "x\n"); },
+         [](const Sandbox& sb) { return "RLNCH0010E: Unable to create " + sb.defaultWorkspace() + "/logs directory."; },
+         EEXIST},
+        {"log file is a directory", false, true,
+         [](Sandbox& sb, RunOptions&) { makeDirs(sb.defaultWorkspace() + "/logs/rcplauncher.log"); },
+         [](const Sandbox& sb) {
+             return "RLNCH0019E: Could not open " + sb.defaultWorkspace() + "/logs/rcplauncher.log for writing!";
+         },
+         EISDIR},
+        {"workspace not writable by the user", true, true,
+         [](Sandbox& sb, RunOptions&) { makeDirs(sb.defaultWorkspace()); },
+         [](const Sandbox& sb) { return "RLNCH0010E: Unable to create " + sb.defaultWorkspace() + "/logs directory."; },
+         EACCES},
+        {"lock file is a directory", false, false,
+         [](Sandbox& sb, RunOptions&) { makeDirs(sb.defaultWorkspace() + "/.rcp.lock"); },
+         [](const Sandbox&) { return std::string("RLNCH0054E: Error locating platform lock file"); }, EISDIR},
+        {"configuration area is a regular file", false, false,
+         [](Sandbox& sb, RunOptions&) { writeText(sb.defaultConfig(), "x\n"); },
+         [](const Sandbox& sb) { return "RLNCH0010E: Unable to create " + sb.defaultConfig() + " directory."; },
+         EEXIST},
+        {"startup record is a directory", false, false,
+         [](Sandbox& sb, RunOptions&) { makeDirs(sb.defaultConfig() + "/args.properties"); },
+         [](const Sandbox& sb) {
+             return "RLNCH0019E: Could not open " + sb.defaultConfig() + "/args.properties for writing!";
+         },
+         EISDIR},
+        {"configuration area not writable by the user", true, false,
+         [](Sandbox& sb, RunOptions&) {
+             makeDirs(sb.defaultConfig());
+             makeDirs(sb.defaultWorkspace() + "/logs");
+             chownTree(sb.defaultWorkspace(), kNobody);
+             ASSERT_EQ(chown(sb.defaultConfig().c_str(), 0, 0), 0);
+         },
+         [](const Sandbox& sb) {
+             return "RLNCH0019E: Could not open " + sb.defaultConfig() + "/args.properties for writing!";
+         },
+         EACCES},
+        {"disk full under the startup record", false, false,
+         [](Sandbox& sb, RunOptions&) {
+             makeDirs(sb.defaultConfig());
+             ASSERT_EQ(symlink("/dev/full", (sb.defaultConfig() + "/args.properties").c_str()), 0);
+         },
+         [](const Sandbox& sb) { return "RLNCH0020E: Error writing to " + sb.defaultConfig() + "/args.properties file."; },
+         ENOSPC},
+        {"update directory is a regular file", false, false,
+         [](Sandbox& sb, RunOptions&) { writeText(sb.defaultConfig() + "/org.eclipse.update", "x\n"); },
+         [](const Sandbox& sb) {
+             return "RLNCH0010E: Unable to create " + sb.defaultConfig() + "/org.eclipse.update directory.";
+         },
+         EEXIST},
+        {"read-only launcher properties of a package-builder install", true, true,
+         [](Sandbox& sb, RunOptions&) {
+             sb.writeLauncherProperties("rcp.base.location=${rcp.home}/base\n"
+                                        "jvm.location=${rcp.home}/jre/bin/java\n"
+                                        "install.configuration=userpb\n");
+             ASSERT_EQ(chmod(sb.launcherProperties().c_str(), 0444), 0);
+         },
+         [](const Sandbox& sb) {
+             return "RLNCH0017E: Could not open " + sb.launcherProperties() + " to append rcp.install.id!";
+         },
+         EACCES},
+    };
+
+    for (const Fault& f : faults) {
+        SCOPED_TRACE(f.name);
+        if (f.asNobody && geteuid() != 0) {
+            std::cout << "skipped (needs root to run the launcher as nobody): " << f.name << "\n";
+            continue;
+        }
+        Sandbox sb;
+        sb.setupInstall("user");
+        RunOptions o;
+        if (f.asNobody) o.uid = o.gid = kNobody;
+        f.prepare(sb, o);
+        if (::testing::Test::HasFatalFailure()) return;
+        const auto homeBefore = userFiles(sb.home());
+        const auto instBefore = userFiles(sb.inst());
+
+        LaunchResult r = sb.run(o);
+        EXPECT_EQ(r.status, 255) << r.describe();
+        EXPECT_FALSE(r.hasChild());
+        EXPECT_EQ(r.terminal, "");
+        EXPECT_EQ(r.tmpLogWritten, f.inTmpLog) << r.describe();
+        EXPECT_EQ(lastLine(f.inTmpLog ? r.tmpLog : r.log), errorLine(f.message(sb), f.err)) << r.describe();
+        expectKept(homeBefore, sb.home());
+        expectKept(instBefore, sb.inst());
+    }
+}
+
+// A reset moves the configuration area to "<area>bak" after removing an
+// older backup. When either cannot be done the launch ends with the
+// matching message, and the area itself is left exactly as it was.
+TEST(Faults, ResetThatCannotSetTheAreaAsideLeavesTheAreaAlone) {
+    struct Case {
+        const char* name;
+        bool asNobody;
+        std::function<void(Sandbox&)> prepare;
+        std::function<std::vector<std::string>(const Sandbox&)> lines;  // the log's last lines
+    };
+    // Removing a tree follows links (the data areas are not meant to hold
+    // any), so a dangling link cannot be examined and stays: root meets a
+    // backup it cannot remove. For a user, a workspace directory that is not
+    // writable refuses both the removal of the old backup and the rename.
+    auto lockWorkspace = [](Sandbox& sb) {
+        chownTree(sb.defaultWorkspace(), kNobody);
+        ASSERT_EQ(chown(sb.defaultWorkspace().c_str(), 0, 0), 0);
+        ASSERT_EQ(chmod(sb.defaultWorkspace().c_str(), 0755), 0);
+    };
+    const std::vector<Case> cases = {
+        {"old backup holds a dangling link", false,
+         [](Sandbox& sb) {
+             makeDirs(sb.defaultConfig() + "bak");
+             ASSERT_EQ(symlink("/nonexistent/target", (sb.defaultConfig() + "bak/dangling").c_str()), 0);
+         },
+         [](const Sandbox& sb) {
+             return std::vector<std::string>{
+                 "RLNCH0083E begin: Error removing old directory",
+                 "Can't stat " + sb.defaultConfig() + "bak/dangling  -  Failed with error 2: " + strerror(ENOENT),
+                 "RLNCH0084E end: Unable to remove all files in the old directory. Please correct the problems listed "
+                 "above"};
+         }},
+        {"old backup is a file the user may not delete", true,
+         [&](Sandbox& sb) {
+             writeText(sb.defaultConfig() + "bak", "old\n");
+             lockWorkspace(sb);
+         },
+         [](const Sandbox& sb) {
+             return std::vector<std::string>{
+                 errorLine("RLNCH0111E: Can't delete old copy of file '" + sb.defaultConfig() + "bak'", EACCES)};
+         }},
+        {"workspace does not let the user rename the area", true, [&](Sandbox& sb) { lockWorkspace(sb); },
+         [](const Sandbox& sb) {
+             return std::vector<std::string>{
+                 errorLine("RLNCH0112E: Can't move file/dir  '" + sb.defaultConfig() + "'", EACCES)};
+         }},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.name);
+        if (c.asNobody && geteuid() != 0) {
+            std::cout << "skipped (needs root to run the launcher as nobody): " << c.name << "\n";
+            continue;
+        }
+        Sandbox sb;
+        sb.setupInstall("user");
+        LaunchResult first = sb.run();
+        ASSERT_EQ(first.status, 0) << first.describe();
+        c.prepare(sb);
+        if (::testing::Test::HasFatalFailure()) return;
+        const auto before = userFiles(sb.defaultConfig());
+        ASSERT_EQ(before.size(), 4u);
+
+        RunOptions o;
+        o.args = {"-resetconfig"};
+        if (c.asNobody) o.uid = o.gid = kNobody;
+        LaunchResult r = sb.run(o);
+        EXPECT_EQ(r.status, 255) << r.describe();
+        EXPECT_FALSE(r.hasChild());
+        EXPECT_EQ(r.terminal, "");
+        std::vector<std::string> expected = c.lines(sb);
+        std::vector<std::string> lines = logLines(r.log);
+        ASSERT_GE(lines.size(), expected.size()) << r.describe();
+        std::vector<std::string> tail(lines.end() - static_cast<long>(expected.size()), lines.end());
+        if (expected.size() > 1) {
+            // The closing line carries the system's text like every error line.
+            EXPECT_TRUE(isErrorLine(tail.back(), expected.back())) << tail.back();
+            tail.back() = expected.back();
+        }
+        EXPECT_EQ(tail, expected) << r.describe();
+        expectKept(before, sb.defaultConfig());
+    }
+}
+
+// Waits until every process this test started or adopted has ended: a child
+// that a killed launcher forked is reparented to the test (a subreaper) and
+// must be gone, or the next launch would rightly take it for a platform.
+void waitForNoChildren(int timeoutSeconds) {
+    auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(timeoutSeconds);
+    int status;
+    while (std::chrono::steady_clock::now() < deadline) {
+        pid_t r = waitpid(-1, &status, WNOHANG);
+        if (r < 0 && errno == ECHILD) return;
+        if (r == 0) std::this_thread::sleep_for(std::chrono::milliseconds(2));
+    }
+    ADD_FAILURE() << "children left running";
+}
+
+int envNumber(const char* name, int fallback) {
+    const char* v = getenv(name);
+    return v && *v ? atoi(v) : fallback;
+}
+
+// A first launch killed at a random moment (SIGKILL: no handler, no exit
+// path) must leave nothing that makes the next launch fail or lose a file:
+// the next launch starts the platform as the main process, the user's own
+// files are all still there, and the per-user files are the ones a clean
+// first launch writes. Every other round runs in an existing workspace
+// holding user data ("-data"), the others in a fresh home. The moments are
+// spread over the time a whole launch takes, measured here (so sanitizers
+// and valgrind stretch them alike). RCP_KILL_ROUNDS and RCP_KILL_SEED
+// repeat a longer or a given run.
+TEST(Faults, LaunchesKilledAtRandomMomentsLeaveAUsableArea) {
+    Sandbox sb;
+    sb.setupInstall("user", "", "resetDir.a=org.x\n");
+    const int rounds = envNumber("RCP_KILL_ROUNDS", 20);
+    const unsigned seed = static_cast<unsigned>(envNumber("RCP_KILL_SEED", static_cast<int>(std::random_device()())));
+    std::mt19937 rng(seed);
+    SCOPED_TRACE("RCP_KILL_SEED=" + std::to_string(seed));
+
+    // The reference: one clean first launch, timed.
+    RunOptions ref;
+    ref.env["HOME"] = sb.path("refhome");
+    sb.beginRuns();
+    auto t0 = std::chrono::steady_clock::now();
+    ASSERT_EQ(sb.waitFor(sb.start(ref)), 0);
+    const auto launchTime = std::chrono::duration_cast<std::chrono::microseconds>(std::chrono::steady_clock::now() - t0);
+    sb.releaseChildren(sb.collectChildren(1), false);
+    const std::string refConfig = sb.path("refhome/KEL/RCP/ID42/tester/.config");
+    const std::map<std::string, FileState> refFiles = userFiles(refConfig);
+    std::uniform_int_distribution<long> delay(0, static_cast<long>(launchTime.count()));
+
+    for (int round = 0; round < rounds; round++) {
+        const bool existingWorkspace = round % 2 == 1;
+        const std::string home = sb.path("home" + std::to_string(round));
+        const std::string data = sb.path("data" + std::to_string(round));
+        writeText(home + "/notes.txt", "the user's own file\n");
+        RunOptions o;
+        o.env["HOME"] = home;
+        if (existingWorkspace) {
+            writeText(data + "/project/a.txt", "project file\n");
+            writeText(data + "/.metadata/.plugins/org.x/state", "plug-in state\n");
+            o.args = {"-data", data};
+        }
+        const std::string ws = existingWorkspace ? data : home + "/KEL/RCP/ID42/tester";
+        const std::map<std::string, FileState> userBefore = userFiles(existingWorkspace ? data : home);
+
+        // A child the killed launcher may still have started records
+        // elsewhere, so that it is not taken for the next launch's child.
+        RunOptions killed = o;
+        killed.env["RCP_STUB_RECORD"] = sb.path("killed.record");
+        const long us = delay(rng);
+        SCOPED_TRACE("round " + std::to_string(round) + ", killed after " + std::to_string(us) + " us");
+        sb.beginRuns();
+        pid_t pid = sb.start(killed);
+        std::this_thread::sleep_for(std::chrono::microseconds(us));
+        kill(pid, SIGKILL);
+        const int killedStatus = sb.waitFor(pid);
+        EXPECT_TRUE(killedStatus == 128 + SIGKILL || killedStatus == 0) << killedStatus;
+        waitForNoChildren(15);
+
+        LaunchResult r = sb.run(o);
+        ASSERT_EQ(r.status, 0) << r.describe() << readText(ws + "/logs/rcplauncher.log");
+        ASSERT_TRUE(r.hasChild());
+        EXPECT_EQ(r.child().argIndex("-useDaemon"), -1);
+        EXPECT_EQ(r.terminal, "");
+        expectKept(userBefore, existingWorkspace ? data : home);
+        // The same files as after a clean launch, no work file left over.
+        EXPECT_EQ(listTree(ws + "/.config"), listTree(refConfig));
+        const std::map<std::string, FileState> files = userFiles(ws + "/.config");
+        ASSERT_EQ(files.size(), refFiles.size());
+        for (const auto& f : refFiles) {
+            if (f.first == "args.properties") continue;  // names the workspace
+            EXPECT_EQ(files.at(f.first).bytes, f.second.bytes) << f.first;
+        }
+        if (::testing::Test::HasFailure()) break;
+    }
+}
+
+}  // namespace

@@ -1,0 +1,202 @@
+// The two fixed paths the launcher uses in the world-writable /tmp: the
+// fallback log /tmp/rcplauncher.log and the preload link
+// /tmp/kel.rcp.<user>.<id>.<library>. Another user can plant anything there
+// first. The launcher must never write through a planted link into another
+// file, never remove or replace another user's entry, and never hand the
+// child a preload path that another user controls.
+//
+// The kernel's own protections for sticky directories (protected_symlinks,
+// protected_regular) may or may not be on, so the cases are chosen to hold
+// either way: a link planted by the owner of /tmp (root) is followed by the
+// kernel for every user, and root itself may remove any entry. Cases that
+// run the launcher as "nobody" need root and are skipped otherwise.
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "sandbox.h"
+#include "test_util.h"
+
+using namespace rcptest;
+
+namespace {
+
+const int kNobody = 65534;
+
+struct Entry {
+    bool present = false;
+    mode_t type = 0;
+    uid_t owner = 0;
+    std::string target;  // of a link
+    std::string bytes;   // of a regular file
+};
+
+Entry entryAt(const std::string& path) {
+    Entry e;
+    struct stat st;
+    if (lstat(path.c_str(), &st) != 0) return e;
+    e.present = true;
+    e.type = st.st_mode & S_IFMT;
+    e.owner = st.st_uid;
+    if (S_ISLNK(st.st_mode)) {
+        char buf[4096];
+        ssize_t n = readlink(path.c_str(), buf, sizeof buf);
+        if (n > 0) e.target.assign(buf, static_cast<size_t>(n));
+    } else if (S_ISREG(st.st_mode)) {
+        e.bytes = readText(path);
+    }
+    return e;
+}
+
+bool sameEntry(const Entry& a, const Entry& b) {
+    return a.present == b.present && a.type == b.type && a.owner == b.owner && a.target == b.target &&
+           a.bytes == b.bytes;
+}
+
+void removeEntry(const std::string& path) {
+    if (entryAt(path).type == S_IFDIR) removeTree(path);
+    else unlink(path.c_str());
+}
+
+// A link at the fallback log's path, planted before a launch that ends
+// before its log directory is known ("-version"): the launch ends as always,
+// and neither the link nor the file it points to changes.
+TEST(SharedTmp, FallbackLogNeverWritesThroughAPlantedLink) {
+    struct Case {
+        const char* name;
+        int linkOwner;     // who planted the link
+        bool asNobody;     // the launcher's user
+    };
+    const Case cases[] = {
+        {"another user's link, launcher run by root", kNobody, false},
+        {"link of /tmp's owner, launcher run by a user who may write the target", 0, true},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.name);
+        if (c.asNobody && geteuid() != 0) {
+            std::cout << "skipped (needs root): " << c.name << "\n";
+            continue;
+        }
+        Sandbox sb;
+        sb.setupInstall("user");
+        const std::string victim = sb.path("victim");
+        writeText(victim, "another file's content\n", 0666);
+        RunOptions o;
+        o.args = {"-version"};
+        if (c.asNobody) o.uid = o.gid = kNobody;
+
+        sb.beginRuns();  // removes any earlier log
+        ASSERT_EQ(symlink(victim.c_str(), kTmpLog), 0);
+        ASSERT_EQ(lchown(kTmpLog, static_cast<uid_t>(c.linkOwner), static_cast<gid_t>(c.linkOwner)), 0);
+        const Entry link = entryAt(kTmpLog);
+        const Entry target = entryAt(victim);
+        const int status = sb.waitFor(sb.start(o));
+        const Entry linkAfter = entryAt(kTmpLog);
+        const Entry targetAfter = entryAt(victim);
+        unlink(kTmpLog);
+
+        EXPECT_EQ(status, 255);
+        EXPECT_EQ(sb.terminalOutput(), "");
+        EXPECT_TRUE(sameEntry(linkAfter, link)) << "the planted link was replaced";
+        EXPECT_TRUE(sameEntry(targetAfter, target)) << "written through the link: " << targetAfter.bytes;
+    }
+}
+
+// The preload library's path holds a blank, so the child reaches it through
+// the link /tmp/kel.rcp.<user>.<id>.<name>. The launcher makes and uses that
+// link only when the entry there is (or becomes) its own link to the
+// library: anything another user planted stays as it is and is not handed
+// to the child, and the launch still starts the platform.
+TEST(SharedTmp, PreloadLinkIsOnlyEverOurOwn) {
+    // A user name of this test run, so that runs in parallel do not meet.
+    const std::string user = "rcptmp" + std::to_string(getpid());
+    const std::string linkPath = "/tmp/kel.rcp." + user + ".ID42.libhook.so";
+
+    struct Case {
+        const char* name;
+        bool asNobody;
+        // Plants an entry at the link path; lib is the library, victim a
+        // file of someone else.
+        std::function<void(const std::string& lib, const std::string& victim)> plant;
+        bool used;  // the child gets the link in LD_PRELOAD
+    };
+    auto plantLink = [&](const std::string& to, int owner) {
+        ASSERT_EQ(symlink(to.c_str(), linkPath.c_str()), 0);
+        ASSERT_EQ(lchown(linkPath.c_str(), static_cast<uid_t>(owner), static_cast<gid_t>(owner)), 0);
+    };
+    const std::vector<Case> cases = {
+        {"nothing there", false, [](const std::string&, const std::string&) {}, true},
+        {"our own link to another library", false,
+         [&](const std::string&, const std::string& victim) { plantLink(victim, static_cast<int>(geteuid())); }, true},
+        {"our own link to the library", false,
+         [&](const std::string& lib, const std::string&) { plantLink(lib, static_cast<int>(geteuid())); }, true},
+        {"another user's link to another file", false,
+         [&](const std::string&, const std::string& victim) { plantLink(victim, kNobody); }, false},
+        {"another user's link to the library", false,
+         [&](const std::string& lib, const std::string&) { plantLink(lib, kNobody); }, false},
+        {"another user's regular file", false,
+         [&](const std::string&, const std::string&) {
+             writeText(linkPath, "planted\n", 0666);
+             ASSERT_EQ(chown(linkPath.c_str(), kNobody, kNobody), 0);
+         },
+         false},
+        {"another user's directory", false,
+         [&](const std::string&, const std::string&) {
+             ASSERT_EQ(mkdir(linkPath.c_str(), 0777), 0);
+             ASSERT_EQ(chown(linkPath.c_str(), kNobody, kNobody), 0);
+         },
+         false},
+        {"root's link to another file, launcher run by a user", true,
+         [&](const std::string&, const std::string& victim) { plantLink(victim, 0); }, false},
+    };
+
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.name);
+        if (c.asNobody && geteuid() != 0) {
+            std::cout << "skipped (needs root): " << c.name << "\n";
+            continue;
+        }
+        Sandbox sb;
+        const std::string lib = sb.path("lib dir/libhook.so");
+        const std::string victim = sb.path("victim.so");
+        sb.setupInstall("user", "", "library.preload=" + lib + "\n");
+        writeText(lib, "not really a library\n");
+        writeText(victim, "someone else's file\n", 0666);
+        RunOptions o;
+        o.env = {{"USER", user}};
+        if (c.asNobody) {
+            o.uid = o.gid = kNobody;
+            ASSERT_EQ(chown(sb.home().c_str(), kNobody, kNobody), 0);
+        }
+
+        removeEntry(linkPath);
+        c.plant(lib, victim);
+        if (::testing::Test::HasFatalFailure()) return;
+        const Entry planted = entryAt(linkPath);
+        const Entry victimBefore = entryAt(victim);
+        LaunchResult r = sb.run(o);
+        const Entry after = entryAt(linkPath);
+        removeEntry(linkPath);
+
+        EXPECT_EQ(r.status, 0) << r.describe();
+        ASSERT_TRUE(r.hasChild());
+        EXPECT_TRUE(sameEntry(entryAt(victim), victimBefore)) << "written through the link";
+        const auto preload = r.child().env.find("LD_PRELOAD");
+        const bool linkUsed = preload != r.child().env.end() && preload->second.find(linkPath) != std::string::npos;
+        EXPECT_EQ(linkUsed, c.used);
+        if (c.used) {
+            EXPECT_EQ(preload->second, linkPath);
+            EXPECT_EQ(after.type, static_cast<mode_t>(S_IFLNK));
+            EXPECT_EQ(after.target, lib);
+            EXPECT_EQ(after.owner, geteuid());
+        } else {
+            EXPECT_TRUE(sameEntry(after, planted)) << "another user's entry was replaced";
+        }
+    }
+}
+
+}  // namespace
