@@ -3,7 +3,9 @@
 // values the other modules need: the log directory of a workspace, the path
 // of a per-configuration template file and the time stamp used for new
 // installation identifiers.
+#include <sys/stat.h>
 #include <sys/time.h>
+#include <unistd.h>
 
 #include <cwchar>
 #include <string>
@@ -56,8 +58,13 @@ void writeStartupArgs(int argc, wchar_t** argv, const wstring& configLocation) {
     wstring tfile = configLocation + L"/" + ARGS_PROPERTIES;
     convertToOsSeparator(tfile);
 
+    // An existing record is written over and cut to the new length at the
+    // end rather than emptied first: emptying a file that is then rewritten
+    // makes some file systems (ext4) free its blocks and force the new ones to
+    // disk on close, which is most of what writing the record would cost.
     FILE* fp = nullptr;
-    open_wfile(fp, tfile.c_str(), L"w+");
+    open_wfile(fp, tfile.c_str(), L"r+");
+    if (fp == nullptr) open_wfile(fp, tfile.c_str(), L"w+");
     if (fp == nullptr) {
         fatalErrorA("RLNCH0019E: Could not open %ls for writing!", tfile.c_str(), true);
         return;
@@ -86,7 +93,15 @@ void writeStartupArgs(int argc, wchar_t** argv, const wstring& configLocation) {
     if (!writeRecordLine(fp, ARGC_KEY, std::to_wstring(writeNum), tfile)) return;
 
     // A full disk shows up only when the buffer is flushed.
-    if (fclose(fp) != 0) fatalErrorA("RLNCH0020E: Error writing to %ls file.", tfile.c_str(), true);
+    bool written = fflush(fp) == 0;
+    if (written) {
+        // Only a regular file longer than the new record has anything to cut.
+        const off_t length = lseek(fileno(fp), 0, SEEK_CUR);
+        struct stat st;
+        if (length >= 0 && fstat(fileno(fp), &st) == 0 && S_ISREG(st.st_mode) && st.st_size > length)
+            written = ftruncate(fileno(fp), length) == 0;
+    }
+    if (fclose(fp) != 0 || !written) fatalErrorA("RLNCH0020E: Error writing to %ls file.", tfile.c_str(), true);
 }
 
 void getLogLocation(wstring& logLocation, const wstring& workspaceLocation) {

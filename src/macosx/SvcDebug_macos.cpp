@@ -2,6 +2,7 @@
 // Until that file is open every line waits in an in-memory queue, so that a
 // launch that dies early still leaves its whole story in /tmp/rcplauncher.log.
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -148,8 +149,12 @@ std::string narrowFormatForWideArg(const char* msg) {
 
 // Opens the log without following a symbolic link at its name, so that a link
 // planted at a fixed path (the /tmp fallback) is never written through.
+// The old content is not truncated here but cut after the first write (see
+// enableLogging): emptying a file that is then rewritten makes some file
+// systems (ext4) free its blocks and force them to disk again on close,
+// which costs more than the rest of a launch's file work.
 FILE* openLogStream(const std::string& path) {
-    int fd = open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, 0666);
+    int fd = open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0666);
     if (fd < 0) return nullptr;
     FILE* fp = fdopen(fd, "w+");
     if (fp == nullptr) {
@@ -158,6 +163,22 @@ FILE* openLogStream(const std::string& path) {
     }
     fwide(fp, -1);
     return fp;
+}
+
+// Cuts whatever an earlier launch left beyond the first bytes this launch
+// wrote from the start of the file (written < 0: as far as the file position
+// says); from then on the file holds exactly what this launch wrote. errno
+// is kept: the next error line reports its own cause.
+void cutAfter(FILE* fp, off_t written) {
+    const int savedErrno = errno;
+    const int fd = fileno(fp);
+    if (written < 0) written = lseek(fd, 0, SEEK_CUR);
+    struct stat st;
+    if (written >= 0 && fstat(fd, &st) == 0 && S_ISREG(st.st_mode) && st.st_size > written &&
+        ftruncate(fd, written) != 0) {
+        // Nothing more can be done; the lines of this launch are in place.
+    }
+    errno = savedErrno;
 }
 
 }  // namespace
@@ -176,8 +197,9 @@ bool enableLogging(const std::wstring& logLocation) {
         return false;
     }
     logFILE = fp;
-    fprintf(logFILE, "%s\n", logque.c_str());
-    fflush(logFILE);
+    const int printed = fprintf(logFILE, "%s\n", logque.c_str());
+    const bool flushed = fflush(logFILE) == 0;
+    cutAfter(logFILE, printed >= 0 && flushed ? printed : -1);
     logque.clear();
     return true;
 }

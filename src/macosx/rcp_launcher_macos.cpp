@@ -110,14 +110,19 @@ bool isProcessNumber(const char* name)
 
 void read_executable_path(std::string& path)
 {
-    std::string raw = systemExecutablePath();
-    char* resolved = realpath(raw.c_str(), nullptr);
-    if (resolved == nullptr) {
-        path.clear();
-    } else {
-        path = resolved;
-        free(resolved);
+    // The launcher's own file does not move while it runs, and resolving it
+    // costs a readlink per path component: one successful answer serves the
+    // whole run.
+    static std::string resolvedPath;
+    if (resolvedPath.empty()) {
+        std::string raw = systemExecutablePath();
+        char* resolved = realpath(raw.c_str(), nullptr);
+        if (resolved != nullptr) {
+            resolvedPath = resolved;
+            free(resolved);
+        }
     }
+    path = resolvedPath;
     SvcDebugOutA(path.c_str());
 }
 

@@ -338,15 +338,25 @@ int readFile(FILE* inX, const wchar_t* mode, std::wstring& inputLineX)
     // The properties reader calls this once per line; one scratch area serves
     // every call instead of a fresh 200 KB allocation each time.
     static char scratch[READ_SCRATCH_SIZE];
+    // A read loop passes the same format on every call: it is converted and
+    // checked again only when it changes.
+    static std::wstring lastMode;
+    static std::string safeFormat;
+    static size_t width = 0;
+    static bool formatOk = false;
+    static bool checked = false;
     inputLineX.clear();
     if (inX == nullptr || mode == nullptr) {
         return EOF;
     }
-    std::string format;
-    wcstochar(format, mode);
-    std::string safeFormat;
-    size_t width = 0;
-    if (!boundedFormat(format, safeFormat, width)) {
+    if (!checked || lastMode != mode) {
+        std::string format;
+        wcstochar(format, mode);
+        formatOk = boundedFormat(format, safeFormat, width);
+        lastMode = mode;
+        checked = true;
+    }
+    if (!formatOk) {
         // A format that could write past the scratch area (or through a
         // missing argument) is never handed to fscanf; ending the caller's read
         // loop is the only safe answer.

@@ -5,6 +5,7 @@
 // encoding becomes U+DC00 + byte on the way in and that byte again on the way
 // out, so a file name or argument in any encoding reaches the system exactly
 // as it arrived.
+#include <langinfo.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -20,15 +21,36 @@ namespace {
 constexpr wchar_t ESCAPE_LOW = 0xDC80;
 constexpr wchar_t ESCAPE_HIGH = 0xDCFF;
 
-std::wstring decodeMultibyte(const char* cs) {
-    std::wstring out;
-    if (cs == nullptr) return out;
+// In UTF-8 every byte below 0x80 is the character of the same code and never
+// part of a longer sequence, and the encoding has no shift state: such bytes
+// need no trip through mbrtowc/wcrtomb, which costs more than the rest of
+// reading a properties line. Other encodings take the general path.
+bool localeIsUtf8() {
+    const char* codeset = nl_langinfo(CODESET);
+    return codeset != nullptr && strcmp(codeset, "UTF-8") == 0;
+}
+
+// Decodes into out, whose storage is reused (a line reader calls this once
+// per line).
+void decodeMultibyte(const char* cs, std::wstring& out) {
+    out.clear();
+    if (cs == nullptr) return;
     size_t len = strlen(cs);
     out.reserve(len);
+    const bool utf8 = localeIsUtf8();
     mbstate_t state;
     memset(&state, 0, sizeof state);
     size_t i = 0;
     while (i < len) {
+        if (utf8 && static_cast<unsigned char>(cs[i]) < 0x80) {
+            size_t end = i + 1;
+            while (end < len && static_cast<unsigned char>(cs[end]) < 0x80) ++end;
+            const size_t at = out.size();
+            out.resize(at + (end - i));
+            for (size_t k = i; k < end; ++k) out[at + (k - i)] = static_cast<wchar_t>(cs[k]);
+            i = end;
+            continue;
+        }
         wchar_t wc = 0;
         size_t n = mbrtowc(&wc, cs + i, len - i, &state);
         if (n == static_cast<size_t>(-1) || n == static_cast<size_t>(-2) || n == 0) {
@@ -41,7 +63,6 @@ std::wstring decodeMultibyte(const char* cs) {
         out += wc;
         i += n;
     }
-    return out;
 }
 
 // Returns false when some character had no multibyte form ('?' written).
@@ -49,10 +70,20 @@ bool encodeMultibyte(const wchar_t* wcs, std::string& out) {
     out.clear();
     if (wcs == nullptr) return true;
     bool ok = true;
+    const bool utf8 = localeIsUtf8();
     mbstate_t state;
     memset(&state, 0, sizeof state);
     char buf[MB_LEN_MAX];
     for (const wchar_t* p = wcs; *p != 0; ++p) {
+        if (utf8 && *p > 0 && *p < 0x80) {
+            const wchar_t* end = p + 1;
+            while (*end > 0 && *end < 0x80) ++end;
+            const size_t at = out.size();
+            out.resize(at + static_cast<size_t>(end - p));
+            for (const wchar_t* q = p; q < end; ++q) out[at + static_cast<size_t>(q - p)] = static_cast<char>(*q);
+            p = end - 1;  // the loop steps onto end
+            continue;
+        }
         if (*p >= ESCAPE_LOW && *p <= ESCAPE_HIGH) {
             out += static_cast<char>(*p - 0xDC00);
             continue;
@@ -85,10 +116,14 @@ String mallocString(unsigned long len) {
     return s;
 }
 
-String chartowcs(const char* cs) { return copyString(decodeMultibyte(cs).c_str()); }
+String chartowcs(const char* cs) {
+    std::wstring wide;
+    decodeMultibyte(cs, wide);
+    return copyString(wide.c_str());
+}
 
 const wchar_t* chartowstr(const char* cs, std::wstring& wstr) {
-    wstr = decodeMultibyte(cs);
+    decodeMultibyte(cs, wstr);
     return wstr.c_str();
 }
 

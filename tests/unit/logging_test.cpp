@@ -36,7 +36,7 @@ TEST_F(LoggingTest, QueuesUntilTheLogOpensThenWritesTheBlockAndAnEmptyLine) {
     ASSERT_TRUE(enableLogging(dir.wpath()));
     EXPECT_EQ(getLogQueue(), "");
     SvcDebugOutA("after");
-    // "w+" truncates what an earlier launch left; the queued block is followed
+    // What an earlier launch left is gone; the queued block is followed
     // by one empty line; later lines go straight to the file.
     EXPECT_EQ(readText(dir.sub("rcplauncher.log")),
               "first\nRLNCH0099E: bad (x%sy)" + suffix(ENOENT) + "\n\nafter\n");
