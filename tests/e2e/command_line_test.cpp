@@ -301,6 +301,12 @@ TEST(CommandLine, ConsoleRestartAndPreloadLink) {
     sb.writeFile(lib, "");
     const std::string link = "/tmp/kel.rcp.tester.ID42.libpre." + std::to_string(getpid()) + ".so";
     unlink(link.c_str());
+    // The link outlives the launcher by design; this test removes it however
+    // it ends.
+    struct Unlink {
+        const std::string& path;
+        ~Unlink() { unlink(path.c_str()); }
+    } removeLink{link};
     sb.setupInstall("user", "", "vmfix.noconsole=-Dfix=1\nlibrary.preload=" + lib + "\n");
     struct Case {
         std::vector<std::string> args;
@@ -345,7 +351,6 @@ TEST(CommandLine, ConsoleRestartAndPreloadLink) {
         EXPECT_EQ(n < 0 ? "<no link>" : std::string(target, static_cast<size_t>(n)), lib);
         EXPECT_EQ(withoutLoaderWarnings(r.terminal), "");
     }
-    unlink(link.c_str());
 }
 
 }  // namespace
