@@ -1,0 +1,174 @@
+// The child's command line and environment where a launch of the built
+// launcher cannot show them: the multi-user service's start, the builders'
+// odd inputs, the library path, the preload link and the initial launch.
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <filesystem>
+
+#include "unit_support.h"
+
+namespace {
+
+std::string env(const char* name) {
+    const char* v = getenv(name);
+    return v != nullptr ? v : "<unset>";
+}
+
+// The service is started by a launcher in the service layout: the test
+// program copies itself there, and the copy, finding RCP_SERVICE_PROBE set,
+// starts the service instead of running tests and writes down what it built.
+class ServiceStartProbe : public ::testing::Environment {
+    void SetUp() override {
+        const char* out = getenv("RCP_SERVICE_PROBE");
+        if (out == nullptr) return;
+        resetState();
+        enableLogging(widen(std::string(out) + ".log"));
+        WArgs args{L"probe", L"-x"};
+        startupMUService(args.argc(), args.argv());
+        std::string text;
+        for (const std::wstring& a : launchArgs) text += narrow(a) + " ";
+        writeText(out, text + "SVC_ENV=" + env("SVC_ENV"));
+        _exit(eConfig == multiuser_service ? 0 : 3);
+    }
+};
+const auto* const serviceProbe = ::testing::AddGlobalTestEnvironment(new ServiceStartProbe);
+
+TEST(CmdlineTest, MultiUserServiceStartsFromItsOwnAreaInTheServiceLayout) {
+    TempDir dir;
+    const std::string inst = std::filesystem::canonical(dir.path()), svc = inst + "/p1/p2/p3/svc", out = dir.sub("out");
+    std::string self;  // the service directory lies two, the installation six levels above the launcher's
+    read_executable_path(self);
+    writeText(svc + "/b1/b2/probe", readText(self), 0755);
+    writeText(svc + "/rcp/rcplauncher.properties", "rcp.install.id=SVC1\nrcp.base.location=${rcp.home}/base\n"
+                                                   "jvm.location=/jvm/java\ninstall.configuration=lockdown\n");
+    writeText(inst + "/base/rcpinstall.properties", "application=svc.app\ncp=/ignored.jar\n-Dsvc=1\nenv.set.SVC_ENV=on\n");
+    writeText(inst + "/base/config.ini", "osgi.bundles=x\n");
+    writeText(inst + "/base/platform.xml", "<config/>\n");
+    const std::string probe = "RCP_SERVICE_PROBE=" + out + " " + svc + "/b1/b2/probe --gtest_filter=*Empty* >/dev/null 2>&1";
+    EXPECT_EQ(system(probe.c_str()), 0) << readText(out + ".log");
+    const std::string ws = inst + "/eclipse/.muservice";
+    EXPECT_EQ(readText(out), "/jvm/java -Drcp.home=" + inst + " -Drcp.data=" + ws + " -Dcom.kel.rcp.install.id=SVC1 "
+                             "-Drcp.install.config=multiuser -Dsvc=1 -Drcp.osgi.install.area=" + inst + "/eclipse -cp " +
+                             inst + "/base/startup.jar org.eclipse.core.launcher.Main -nosplash -x -data " + ws +
+                             " -configuration " + ws + "/.config -application svc.app SVC_ENV=on") << readText(out + ".log");
+    EXPECT_NE(readText(ws + "/.config/rcpinstall.properties").find("vm=/jvm/java\n"), std::string::npos);
+    EXPECT_TRUE(pathExists(ws + "/.config/config.ini") && pathExists(ws + "/.config/org.eclipse.update/platform.xml"));
+}
+
+TEST(CmdlineTest, BuildersTakeOnlyWhatTheirOptionsGive) {
+    auto vm = [](PropArray& p, WArgs& a) { addVmToCommandLine(p.v(), p.v(), a.argc(), a.argv()); };
+    auto startup = [](PropArray& p, WArgs& a) { addStartupToCommandLine(p.v(), a.argc(), a.argv()); };
+    auto options = [](PropArray& p, WArgs& a) {
+        std::wstring dir = L"/i";
+        addMainOptionsToCommandLine(p.v(), p.v(), a.argc(), a.argv(), dir);
+    };
+    const std::tuple<installCfg, Strings, std::function<void(PropArray&, WArgs&)>, Strings> cases[] = {
+        {user, {L"l", L"-vm", L"/A", L"-vm", L"/C"}, vm, {L"/e", L"-vm", L"/A"}},  // the first wins
+        {lockdown, {L"l", L"-vm"}, vm, {L"/e", L"-vm", L"/B/java"}},             // no value: as if absent
+        {service, {L"l", L"-vm", L"/A"}, vm, {L"/A"}},                           // the JVM is the program
+        {user, {L"l", L"-perfJar", L"/p/1.jar", L"-perfJar", L"/p/2.jar"}, startup, {L"/e", L"-startup", L"/p/1.jar"}},
+        // the launcher's own pairs and orders are held back, by index only; a value is consumed even before -vmargs
+        {user, {L"l", L"-configuration", L"/c", L"-vm", L"/j", L"-k", L"-restart", L"-resetconfig", L"-vm", L"/b"}, options,
+         {L"/e", L"-k", L"-vm", L"/b", L"-data", L"/ws", L"-configuration", L"/ws/.config"}},
+        {user, {L"l", L"-data", L"/m/", L"-x", L"-data", L"/2"}, options,
+         {L"/e", L"-x", L"-data", L"/2", L"-data", L"/m", L"-configuration", L"/m/.config"}},
+        {user, {L"l", L"-vm", L"-vmargs", L"-a"}, options, {L"/e", L"-data", L"/ws", L"-configuration", L"/ws/.config"}},
+    };
+    for (const auto& [cfg, argv, build, expected] : cases) {
+        resetState(cfg);
+        launchArgs = {L"/e"};
+        PropArray props{{L"vm", L"/B/java"}, {L"rcp.install.id", L"ID"}, {L"rcp.data", L"/ws"}};
+        WArgs args(argv);
+        build(props, args);
+        EXPECT_EQ(launchArgs, expected) << narrow(argv[1]);
+    }
+    TempDir dir;
+    writeText(dir.sub("bin/java"), "", 0755);
+    std::wstring javaw = dir.wsub("bin/javaw"), java = dir.wsub("bin/java");
+    EXPECT_TRUE(isJavaw(javaw, L"javaw", L"java"));
+    EXPECT_EQ(javaw, java);
+    EXPECT_FALSE(isJavaw(javaw, L"javaw", L"java") || replaceJavaExecutableName(javaw, L"java", L"jexec"));
+    EXPECT_EQ(javaw, java);  // no such file: unchanged
+}
+
+TEST(CmdlineTest, LibraryPathHasNoEmptyPieces) {
+    const std::tuple<const char*, const char*, const char*, const char*> cases[] = {  // prepend, inherited, append
+        {nullptr, nullptr, nullptr, nullptr}, {"/p", "/c", "/a", "/p:/c:/a"}, {"/p", nullptr, "/a", "/p:/a"},
+        {nullptr, "", "/a", "/a"}, {"", "/c", nullptr, "/c"}, {"", nullptr, "", nullptr}};
+    for (const auto& [prepend, inherited, append, result] : cases) {
+        resetState(user);
+        inherited ? setenv("LD_LIBRARY_PATH", inherited, 1) : unsetenv("LD_LIBRARY_PATH");
+        PropArray lib;
+        if (prepend) addProps(lib, {{L"library.path.prepend", widen(prepend)}});
+        if (append) addProps(lib, {{L"library.path.append", widen(append)}});
+        addLibpathToCommandLine(lib.v());
+        EXPECT_EQ(env("LD_LIBRARY_PATH"), result ? result : "<unset>") << (prepend ? prepend : "-") << (append ? append : "-");
+    }
+    unsetenv("LD_LIBRARY_PATH");
+}
+
+TEST(CmdlineTest, PreloadThroughOurOwnLink) {
+    resetState(user);
+    setenv("USER", "cmdtester", 1);
+    TempDir dir;
+    const std::wstring id = L"cmdt" + std::to_wstring(getpid()), lib = dir.wsub("my libs/libhook.so");
+    const std::string link = "/tmp/kel.rcp.cmdtester." + narrow(id) + ".libhook.so";
+    writeText(narrow(lib), "", 0755);
+    unsetenv("LD_PRELOAD");
+    setPreload(dir.wsub("my libs/none.so").c_str(), id.c_str());  // no such library: nothing set
+    EXPECT_EQ(env("LD_PRELOAD"), "<unset>");
+    struct stat made, kept;
+    setPreload(lib.c_str(), id.c_str());
+    ASSERT_EQ(lstat(link.c_str(), &made), 0);
+    setPreload(lib.c_str(), id.c_str());  // a later launch keeps the link
+    ASSERT_EQ(lstat(link.c_str(), &kept), 0);
+    EXPECT_EQ(made.st_ino, kept.st_ino);
+    EXPECT_EQ(std::filesystem::read_symlink(link), narrow(lib));
+    EXPECT_EQ(env("LD_PRELOAD"), link);
+    unlink(link.c_str());
+    unsetenv("LD_PRELOAD");
+}
+
+TEST(CmdlineTest, InitialLaunchAndFatalInputs) {
+    const std::tuple<installCfg, const wchar_t*, bool> cases[] = {  // configuration, completion property, required
+        {user, nullptr, true}, {user, L"true", false}, {userpb, L"trueish", false}, {multiuser, L"TRUE", true},
+        {service, nullptr, false}, {lockdown, nullptr, false}, {multiuser_service, nullptr, false}};
+    for (const auto& [cfg, completed, required] : cases) {
+        resetState(cfg);
+        // out of file order: the numbers decide; the flag only has to begin a value
+        PropArray launcher{{L"config.initial.3", L"done"}, {L"config.initial.1", L"-a"}, {L"config.initial.2", L"-initialCompleteFlagX"}};
+        PropArray install;
+        if (completed) addProps(install, {{L"done", completed}});
+        EXPECT_EQ(isInitialRequired(launcher.v(), install.v()), required) << cfg;
+    }
+    EXPECT_TRUE(isNewProvisioningLevel(nullptr, L"1") && isNewProvisioningLevel(L"1", nullptr) && isNewProvisioningLevel(L"1", L"2"));
+    EXPECT_FALSE(isNewProvisioningLevel(L"1.0", L"1.0"));
+
+    resetState(user);
+    TempDir dir;
+    writeText(dir.sub("plain/macosx/x86/eclipse"), "", 0644);
+    writeText(dir.sub("lib with blank.so"), "");
+    PropArray none, vmx{{L"vmx", L"/B/java"}}, notExecutable{{L"rcp.base.location", dir.wsub("plain")}}, preload{{L"library.preload", L"/x.so"}};
+    PropArray gap{{L"config.initial.1", L"-initialCompleteFlag"}, {L"config.initial.2", L"k"}, {L"config.initial.4", L"x"}};
+    PropArray flagLast{{L"config.initial.1", L"-a"}, {L"config.initial.2", L"-initialCompleteFlag"}};
+    WArgs args{L"l", L"-vm"};
+    std::wstring vm = dir.wsub("java"), installDir = L"/i";
+    expectFatal({
+        {[&] { addVmToCommandLine(vmx.v(), none.v(), args.argc(), args.argv()); }, "RLNCH0002E: vm string must be specified!"},
+        {[&] { isJavaw(vm, L"java", L"javaz"); }, "RLNCH0003E: Specified vm (" + dir.sub("javaz") + ") does not exist!"},
+        {[&] { addMainOptionsToCommandLine(vmx.v(), none.v(), 1, args.argv(), installDir); }, "RLNCH0005E: Couldn't find the rcp.install.id property!"},
+        {[&] { addLdPreloadToCommandLine(preload.v()); }, "RLNCH0005E: Couldn't find the rcp.install.id property!"},
+        {[&] { unsetenv("USER"); setPreload(dir.wsub("lib with blank.so").c_str(), L"ID"); }, "RLNCH0006E: Couldn't find the user name!"},
+        {[&] { addBaseEclipseToCommandLine(notExecutable.v()); },
+         "RLNCH0007E: " + dir.sub("plain") + "/macosx/x86/eclipse is not executable or does not exist."},
+        {[&] { addBaseEclipseToCommandLine(none.v()); }, "RLNCH0011E: Unable to determine RCP Base"},
+        {[&] { isInitialRequired(gap.v(), none.v()); }, "RLNCH0114E: Invalid config.initial arguments. config.initial.3 not found"},
+        {[&] { isInitialRequired(flagLast.v(), none.v()); }, "RLNCH0115E: Invalid config.initial arguments. -initialCompleteFlag not found"},
+        {[&] { if (chdir(dir.path().c_str()) == 0) setPreload(L"lib with blank.so", L"ID"); },
+         "RLNCH0189E: Couldn't find filename for library.preload property"},
+    });
+}
+
+}  // namespace
