@@ -1,5 +1,5 @@
 // The user's areas: workspace and configuration locations, the startup
-// record, the per-user files and the reset.
+// record, the per-user files and their base copies, and the reset.
 #include <unistd.h>
 
 #include <cstdlib>
@@ -20,6 +20,7 @@ TEST_F(AreasTest, Locations) {
     setenv("USER", "ann", 1);
     setenv("HOME", "/Users/ann", 1);
     setenv("RCP_AREAS_DIR", "/srv/d", 1);
+    unsetenv("RCP_AREAS_UNSET");
     const Pairs id = {{L"rcp.install.id", L"77"}}, dataAndId = {{L"rcp.install.id", L"77"}, {L"rcp.data", L"/p/d/"}};
     const std::wstring home = L"/Users/ann/KEL/RCP/77/ann";
     const std::tuple<installCfg, Strings, Pairs, std::wstring, std::wstring, int> cases[] = {
@@ -44,9 +45,16 @@ TEST_F(AreasTest, Locations) {
         EXPECT_EQ(getConfigurationLocation(cf, props.v(), args.argc(), args.argv(), installDir), result);
         EXPECT_EQ(ws + L"|" + cf, workspace + L"|" + config);
     }
+    PropArray bad{{L"rcp.install.id", L"1"}, {L"rcp.data", L"/x/${env.RCP_AREAS_UNSET}/${prop.k}"}, {L"k", L"v"}}, none;
+    WArgs args{L"x"};
+    std::wstring installDir, location;
+    expectFatal({{[&] { getWorkspaceLocation(location, bad.v(), 1, args.argv(), installDir); },
+                  "RLNCH0099E: rcp.data property is invalid (/x/${env.RCP_AREAS_UNSET}/v) : "},
+                 {[&] { eConfig = userpb; getInstallID(L"/dev/full", none.v()); },
+                  "RLNCH0018E: Error while writing to /dev/full file. : "}});
 }
 
-TEST_F(AreasTest, StartupRecordEscapesAndLeavesOutTheFirstRestartAndReset) {
+TEST_F(AreasTest, StartupRecordAndBaseCopies) {
     std::wstring launcher;
     getLauncherPath(launcher);
     const std::pair<Strings, std::string> records[] = {
@@ -63,11 +71,15 @@ TEST_F(AreasTest, StartupRecordEscapesAndLeavesOutTheFirstRestartAndReset) {
         EXPECT_EQ(std::wstring(findProperty(L"arg0", props)), launcher);
         freeProperties(props);
     }
-    makeDirs(tmp.sub("full"));
-    ASSERT_EQ(symlink("/dev/full", tmp.sub("full/args.properties").c_str()), 0);
-    WArgs args{L"prog"};
-    expectFatal({{[&] { writeStartupArgs(1, args.argv(), tmp.wsub("full")); },
-                  "RLNCH0020E: Error writing to " + tmp.sub("full/args.properties") + " file."}});
+    // the base copies a configuration takes its per-user files from; without one, the core's own
+    for (const char* sub : {"", "user", "pbuilder", "muservice"}) writeText(tmp.sub("core/config/") + sub + "/t", "");
+    const std::pair<installCfg, std::string> copies[] = {{service, "config//t"}, {serial_multiuser, "config//t"},
+        {lockdown, "config/user/t"}, {userpb, "config/pbuilder/t"}, {multiuser_service, "config/muservice/t"}};
+    for (const auto& [cfg, copy] : copies) {
+        eConfig = cfg;
+        EXPECT_EQ(getCoreFileLocation(tmp.wsub("core"), L"t") + getCoreFileLocation(tmp.wsub("core"), L"x"),
+                  tmp.wsub("core/" + copy) + tmp.wsub("core/x")) << cfg;
+    }
 }
 
 TEST_F(AreasTest, UserPropertiesAreFilteredAndCompleted) {
@@ -89,7 +101,8 @@ TEST_F(AreasTest, UserPropertiesAreFilteredAndCompleted) {
               "c.d=50%%\nrcp.install.id=77\nrcp.data=/d\\#1\\=x\nvm=C\\:/j/vm\nrcp.base.location=${rcp.home}/b\\:1\n"
               "install.configuration=serial.multiuser\ncom.kel.rcp.core.locale=de 1%\ncom.kel.rcp.core.bidi=on\n");
 
-    PropArray plain{{L"rcp.install.id", L"1"}, {L"rcp.base.location", L"/b"}, {L"jvm.location", L"/j"}, {L"install.configuration", L"u"}};
+    PropArray plain{{L"rcp.install.id", L"1"}, {L"rcp.base.location", L"/b"}, {L"jvm.location", L"/j"},
+                    {L"install.configuration", L"u"}};
     const std::string block = "rcp.install.id=1\nvm=/j\nrcp.base.location=/b\ninstall.configuration=u\n";
     const std::tuple<installCfg, std::string, std::string> cases[] = {
         {user, "k=v\n", "k=user\n" + block},  // the configuration's own base copy
@@ -103,13 +116,9 @@ TEST_F(AreasTest, UserPropertiesAreFilteredAndCompleted) {
         create(plain);
         EXPECT_EQ(readText(props), result);
     }
-    writeText(tmp.sub("core/rcpinstall.properties"), "changed=1\n");  // a later launch keeps the file
-    userFirstLaunch = false;
-    create(plain);
-    EXPECT_EQ(readText(props), std::get<2>(cases[3]));
-    EXPECT_FALSE(userFirstLaunch || pathExists(props + ".new"));
     // a missing value ends the launch; the plain copy stays as the administrator's evidence
     unlink(props.c_str());
+    writeText(tmp.sub("core/rcpinstall.properties"), "changed=1\n");
     PropArray incomplete{{L"rcp.install.id", L"1"}, {L"rcp.base.location", L"/b"}, {L"jvm.location", L"/j"}};
     expectFatal({{[&] { create(incomplete); },
                   "RLNCH0008E: Unable to calculate necessary values for user specific rcpinstall.properties file. : "}});
@@ -122,9 +131,9 @@ TEST_F(AreasTest, PlatformXml) {
     const char* copied = "<?xml?>\n<config>\n<feature>\n<feature>\n<p>100%d</p>\n</config>\n";
     // configuration, update.policy.managed, base file, result, directory made, platform.xml
     const std::tuple<installCfg, const wchar_t*, std::string, int, bool, const char*> cases[] = {
-        {user, nullptr, base, 0, true, copied}, {user, L"false", base, 0, true, nullptr},
-        {user, L"False", base, 0, true, copied}, {userpb, nullptr, base, 0, false, nullptr},
-        {user, nullptr, "", -1, true, nullptr},  {user, nullptr, "\n<a/>\n", 0, true, ""}};  // an empty line: no hang
+        {user, nullptr, base, 0, true, copied}, {user, L"false", base, 0, true, nullptr}, {user, L"False", base, 0, true, copied},
+        {userpb, nullptr, base, 0, false, nullptr}, {user, nullptr, "", -1, true, nullptr},
+        {user, nullptr, "\n<a/>\n", 0, true, ""}};  // a leading empty line ends the copy, no hang
     for (const auto& [cfg, policy, text, result, dir, expected] : cases) {
         eConfig = cfg;
         userFirstLaunch = false;
@@ -169,10 +178,15 @@ TEST_F(AreasTest, ResetKeepsTheRegistryAndStaysInsideThePluginState) {
     writeText(file(".config/rcpinstall.properties"), "resetDir.a=org.x\n");
     makeDirs(file(".metadata/.plugins/org.x"));  // a link inside is emptied but cannot be removed
     ASSERT_EQ(symlink(tmp.sub("out").c_str(), file(".metadata/.plugins/org.x/link").c_str()), 0);
+    makeDirs(tmp.sub("fresh/.config"));
     expectFatal({{[&] { resetMetaDataDirs(ws, cfg, core); },
                   "\nRLNCH0107E begin: Error removing metadata plugin directory\nCan't delete dir " +
                       file(".metadata/.plugins/org.x") + "/link  -  Failed with error 20: Not a directory\n\nRLNCH0108E end: "
-                      "Unable to remove all files in the metadata plugin directory. Please correct the problems listed above : "}});
+                      "Unable to remove all files in the metadata plugin directory. Please correct the problems listed above : "},
+                 {[&] { resetMetaDataDirs(tmp.wsub("fresh"), tmp.wsub("fresh/.config"), tmp.wsub("none")); },
+                  "RLNCH0106E: Unable to locate " + tmp.sub("none") + "/rcpinstall.properties file. : "},
+                 {[&] { createReusableWorkspace(tmp.wsub("fresh"), tmp.wsub("fresh/.config")); },
+                  "RLNCH0109E: Unable to locate '" + tmp.sub("fresh/.config/org.eclipse.update/platform.xml") + "' for copying : "}});
 }
 
 }  // namespace

@@ -1,6 +1,6 @@
 // The child's command line and environment where a launch of the built
 // launcher cannot show them: the multi-user service's start, the builders'
-// odd inputs, the library path, the preload link and the initial launch.
+// odd inputs, the library path, the preload link and the fatal inputs.
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -18,7 +18,8 @@ std::string env(const char* name) {
 
 // The service is started by a launcher in the service layout: the test
 // program copies itself there, and the copy, finding RCP_SERVICE_PROBE set,
-// starts the service instead of running tests and writes down what it built.
+// starts the service instead of running tests and writes down what it built
+// (one test is selected so that the environment is set up at all).
 class ServiceStartProbe : public ::testing::Environment {
     void SetUp() override {
         const char* out = getenv("RCP_SERVICE_PROBE");
@@ -67,13 +68,11 @@ TEST(CmdlineTest, BuildersTakeOnlyWhatTheirOptionsGive) {
     const std::tuple<installCfg, Strings, std::function<void(PropArray&, WArgs&)>, Strings> cases[] = {
         {user, {L"l", L"-vm", L"/A", L"-vm", L"/C"}, vm, {L"/e", L"-vm", L"/A"}},  // the first wins
         {lockdown, {L"l", L"-vm"}, vm, {L"/e", L"-vm", L"/B/java"}},             // no value: as if absent
-        {service, {L"l", L"-vm", L"/A"}, vm, {L"/A"}},                           // the JVM is the program
         {user, {L"l", L"-perfJar", L"/p/1.jar", L"-perfJar", L"/p/2.jar"}, startup, {L"/e", L"-startup", L"/p/1.jar"}},
-        // the launcher's own pairs and orders are held back, by index only; a value is consumed even before -vmargs
+        // the launcher's own pairs and orders are held back, by index only; nothing from -vmargs on reaches the
+        // platform, even as the value of -vm
         {user, {L"l", L"-configuration", L"/c", L"-vm", L"/j", L"-k", L"-restart", L"-resetconfig", L"-vm", L"/b"}, options,
          {L"/e", L"-k", L"-vm", L"/b", L"-data", L"/ws", L"-configuration", L"/ws/.config"}},
-        {user, {L"l", L"-data", L"/m/", L"-x", L"-data", L"/2"}, options,
-         {L"/e", L"-x", L"-data", L"/2", L"-data", L"/m", L"-configuration", L"/m/.config"}},
         {user, {L"l", L"-vm", L"-vmargs", L"-a"}, options, {L"/e", L"-data", L"/ws", L"-configuration", L"/ws/.config"}},
     };
     for (const auto& [cfg, argv, build, expected] : cases) {
@@ -131,26 +130,13 @@ TEST(CmdlineTest, PreloadThroughOurOwnLink) {
     unsetenv("LD_PRELOAD");
 }
 
-TEST(CmdlineTest, InitialLaunchAndFatalInputs) {
-    const std::tuple<installCfg, const wchar_t*, bool> cases[] = {  // configuration, completion property, required
-        {user, nullptr, true}, {user, L"true", false}, {userpb, L"trueish", false}, {multiuser, L"TRUE", true},
-        {service, nullptr, false}, {lockdown, nullptr, false}, {multiuser_service, nullptr, false}};
-    for (const auto& [cfg, completed, required] : cases) {
-        resetState(cfg);
-        // out of file order: the numbers decide; the flag only has to begin a value
-        PropArray launcher{{L"config.initial.3", L"done"}, {L"config.initial.1", L"-a"}, {L"config.initial.2", L"-initialCompleteFlagX"}};
-        PropArray install;
-        if (completed) addProps(install, {{L"done", completed}});
-        EXPECT_EQ(isInitialRequired(launcher.v(), install.v()), required) << cfg;
-    }
-    EXPECT_TRUE(isNewProvisioningLevel(nullptr, L"1") && isNewProvisioningLevel(L"1", nullptr) && isNewProvisioningLevel(L"1", L"2"));
-    EXPECT_FALSE(isNewProvisioningLevel(L"1.0", L"1.0"));
-
+TEST(CmdlineTest, FatalInputs) {
     resetState(user);
     TempDir dir;
     writeText(dir.sub("plain/macosx/x86/eclipse"), "", 0644);
     writeText(dir.sub("lib with blank.so"), "");
-    PropArray none, vmx{{L"vmx", L"/B/java"}}, notExecutable{{L"rcp.base.location", dir.wsub("plain")}}, preload{{L"library.preload", L"/x.so"}};
+    PropArray none, vmx{{L"vmx", L"/B/java"}}, preload{{L"library.preload", L"/x.so"}};
+    PropArray notExecutable{{L"rcp.base.location", dir.wsub("plain")}};
     PropArray gap{{L"config.initial.1", L"-initialCompleteFlag"}, {L"config.initial.2", L"k"}, {L"config.initial.4", L"x"}};
     PropArray flagLast{{L"config.initial.1", L"-a"}, {L"config.initial.2", L"-initialCompleteFlag"}};
     WArgs args{L"l", L"-vm"};
@@ -158,14 +144,17 @@ TEST(CmdlineTest, InitialLaunchAndFatalInputs) {
     expectFatal({
         {[&] { addVmToCommandLine(vmx.v(), none.v(), args.argc(), args.argv()); }, "RLNCH0002E: vm string must be specified!"},
         {[&] { isJavaw(vm, L"java", L"javaz"); }, "RLNCH0003E: Specified vm (" + dir.sub("javaz") + ") does not exist!"},
-        {[&] { addMainOptionsToCommandLine(vmx.v(), none.v(), 1, args.argv(), installDir); }, "RLNCH0005E: Couldn't find the rcp.install.id property!"},
+        {[&] { addMainOptionsToCommandLine(vmx.v(), none.v(), 1, args.argv(), installDir); },
+         "RLNCH0005E: Couldn't find the rcp.install.id property!"},
         {[&] { addLdPreloadToCommandLine(preload.v()); }, "RLNCH0005E: Couldn't find the rcp.install.id property!"},
-        {[&] { unsetenv("USER"); setPreload(dir.wsub("lib with blank.so").c_str(), L"ID"); }, "RLNCH0006E: Couldn't find the user name!"},
+        {[&] { unsetenv("USER"); setPreload(dir.wsub("lib with blank.so").c_str(), L"ID"); },
+         "RLNCH0006E: Couldn't find the user name!"},
         {[&] { addBaseEclipseToCommandLine(notExecutable.v()); },
          "RLNCH0007E: " + dir.sub("plain") + "/macosx/x86/eclipse is not executable or does not exist."},
         {[&] { addBaseEclipseToCommandLine(none.v()); }, "RLNCH0011E: Unable to determine RCP Base"},
         {[&] { isInitialRequired(gap.v(), none.v()); }, "RLNCH0114E: Invalid config.initial arguments. config.initial.3 not found"},
-        {[&] { isInitialRequired(flagLast.v(), none.v()); }, "RLNCH0115E: Invalid config.initial arguments. -initialCompleteFlag not found"},
+        {[&] { isInitialRequired(flagLast.v(), none.v()); },
+         "RLNCH0115E: Invalid config.initial arguments. -initialCompleteFlag not found"},
         {[&] { if (chdir(dir.path().c_str()) == 0) setPreload(L"lib with blank.so", L"ID"); },
          "RLNCH0189E: Couldn't find filename for library.preload property"},
     });

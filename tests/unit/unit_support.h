@@ -38,12 +38,8 @@ inline void expectFatal(const std::vector<Fatal>& cases) {
     for (const Fatal& c : cases) {
         SCOPED_TRACE(c.message);
         TempDir dir;
-        EXPECT_EXIT(
-            {
-                enableLogging(dir.wpath());
-                c.run();
-            },
-            ::testing::ExitedWithCode(255), "");
+        auto run = [&] { enableLogging(dir.wpath()); c.run(); };
+        EXPECT_EXIT(run(), ::testing::ExitedWithCode(255), "");
         const std::string log = readText(dir.sub("rcplauncher.log"));
         EXPECT_NE(log.find(c.message), std::string::npos) << log;
     }
