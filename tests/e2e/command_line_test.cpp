@@ -1,199 +1,18 @@
 // The exact command line and environment that the child receives, for every
-// install configuration that a launch can be in, and how the launcher
-// properties ('-config NAME' extensions) change the effective arguments.
+// install configuration that a launch can be in, and how the effective
+// arguments ('-config NAME' extensions, "-debug", "-console", "-restart",
+// "-rcpLauncherWait") shape the child and the launcher's own behaviour.
 #include <gtest/gtest.h>
+#include <signal.h>
 #include <unistd.h>
+
+#include <cerrno>
+#include <chrono>
 
 #include "sandbox.h"
 #include "test_util.h"
 
 using namespace rcptest;
-
-namespace {
-
-// Extra base installation properties used by every case here: a library
-// path to prepend (the child's LD_LIBRARY_PATH then starts with it).
-const char* const kLibPath = "library.path.prepend=${rcp.home}/lib\n";
-
-struct Expect {
-    std::string configuration;              // the -Drcp.install.config word
-    std::vector<std::string> passThrough;   // launcher arguments handed to the platform
-    std::vector<std::string> userVmargs;    // launcher arguments after "-vmargs"
-};
-
-// The child command line of the sandbox installation, as the builders put it
-// together for a user-like configuration (the Eclipse executable is started
-// and told the JVM) or a service one (the JVM is started directly).
-std::vector<std::string> expectedArgs(const Sandbox& sb, const Expect& e) {
-    bool isService = e.configuration == "service";
-    std::string ws = isService ? sb.inst() + "/eclipse/.workspace" : sb.defaultWorkspace();
-    std::string cfg = isService ? sb.inst() + "/eclipse/.config" : sb.defaultConfig();
-    // The service workspace creates <inst>/eclipse, which then is the
-    // OSGi install area; otherwise the fallback below rcp is named.
-    std::string installArea = isService ? sb.inst() + "/eclipse" : sb.inst() + "/rcp/eclipse";
-
-    std::vector<std::string> platform = e.passThrough;
-    for (const std::string& a : {std::string("-data"), ws, std::string("-configuration"), cfg,
-                                 std::string("-application"), std::string("com.kel.demo.app")})
-        platform.push_back(a);
-
-    std::vector<std::string> vm = e.userVmargs;
-    for (const std::string& a :
-         {std::string("-Dvmarg.one=1"), "-Drcp.home=" + sb.inst(), "-Drcp.data=" + ws,
-          std::string("-Dcom.kel.rcp.install.id=ID42"), "-Drcp.install.config=" + e.configuration,
-          std::string("-Dbase.prop=one"), "-Drcp.osgi.install.area=" + installArea, std::string("-Xmx256m"),
-          std::string("-cp"), sb.inst() + "/lib/boot.jar"})
-        vm.push_back(a);
-
-    std::vector<std::string> args;
-    auto append = [&](const std::vector<std::string>& v) { args.insert(args.end(), v.begin(), v.end()); };
-    if (isService) {
-        args.push_back(sb.jvm());
-        append(vm);
-        args.push_back("org.eclipse.core.launcher.Main");
-        args.push_back("-nosplash");
-        append(platform);
-    } else {
-        args.push_back(sb.eclipse());
-        append(platform);
-        append({"-vm", sb.jvm(), "-startup", sb.base() + "/launcher.jar", "-vmargs"});
-        append(vm);
-    }
-    args.push_back("-XstartOnFirstThread");
-    return args;
-}
-
-// The launcher's environment as the child must see it: JAVA_HOME removed,
-// the variables of the installation properties added.
-std::map<std::string, std::string> expectedEnv(const Sandbox& sb, const LaunchResult& r) {
-    std::map<std::string, std::string> env = r.launcherEnv;
-    env.erase("JAVA_HOME");
-    env["JAVA_HIGH_ZIPFDS"] = "500";
-    env["RCP_DEMO"] = "hello world";
-    env["LD_LIBRARY_PATH"] = sb.inst() + "/lib:/opt/inherited/lib";
-    return env;
-}
-
-RunOptions userRun(const std::vector<std::string>& args) {
-    RunOptions o;
-    o.args = args;
-    o.env = {{"JAVA_HOME", "/opt/java"}, {"LD_LIBRARY_PATH", "/opt/inherited/lib"}};
-    return o;
-}
-
-// One launch per install configuration; the child gets exactly this command
-// line and environment, and the lock file names it.
-TEST(CommandLine, EveryInstallConfiguration) {
-    struct Case {
-        std::string property;  // value of install.configuration; "" = no such key
-        std::string word;      // what -Drcp.install.config says
-    };
-    const std::vector<Case> cases = {
-        {"user", "user"},       {"lockdown", "lockdown"},
-        {"serial.multiuser", "serial.multiuser"},       {"multiuser", "multiuser"},
-        {"userpb", "userpb"},   {"service", "service"},
-    };
-    const std::vector<std::string> args = {"-foo", "a b", "-vmargs", "-Duser.vm=1"};
-    for (const auto& c : cases) {
-        SCOPED_TRACE("install.configuration=" + c.property);
-        Sandbox sb;
-        sb.setupInstall(c.property, "", kLibPath);
-        LaunchResult r = sb.run(userRun(args));
-        ASSERT_EQ(r.status, 0) << r.describe();
-        ASSERT_EQ(r.children.size(), 1u);
-        EXPECT_EQ(r.child().argv, expectedArgs(sb, {c.word, {"-foo", "a b"}, {"-Duser.vm=1"}}));
-        EXPECT_EQ(r.child().env, expectedEnv(sb, r));
-        EXPECT_EQ(readText(r.workspace + "/.rcp.lock"), std::to_string(r.child().pid) + std::string(10, ' '));
-        EXPECT_EQ(r.terminal, "");
-    }
-}
-
-// An install configuration the launcher does not know cannot be named to the
-// platform, and one that is missing cannot be written into the user's
-// installation properties: either launch ends in its own log, without a child.
-TEST(CommandLine, UnknownOrMissingInstallConfigurationEndsTheLaunch) {
-    struct Case {
-        std::string property;  // "" = no such key
-        std::string message;
-    };
-    const std::string unknown = "RLNCH0025E: The platform rcp.install.id must be provided for this configuration!";
-    const std::vector<Case> cases = {
-        {"Lockdown", unknown},
-        {"provisioning", unknown},
-        {"user\t", unknown},
-        {"", "RLNCH0008E: Unable to calculate necessary values for user specific rcpinstall.properties file."},
-    };
-    for (const auto& c : cases) {
-        SCOPED_TRACE("install.configuration=" + c.property);
-        Sandbox sb;
-        sb.setupInstall(c.property);
-        LaunchResult r = sb.run(userRun({}));
-        EXPECT_EQ(r.status, 255);
-        EXPECT_FALSE(r.hasChild());
-        std::vector<std::string> lines = logLines(r.log);
-        ASSERT_FALSE(lines.empty());
-        EXPECT_TRUE(isErrorLine(lines.back(), c.message)) << r.describe();
-        EXPECT_EQ(r.terminal, "");
-    }
-}
-
-// '-config NAME' takes arguments from the launcher properties: platform
-// options land before the command line's own "-vmargs", VM options after
-// the command line's VM arguments.
-TEST(CommandLine, ConfigExtensionsFromLauncherProperties) {
-    struct Case {
-        const char* name;
-        std::vector<std::string> args;
-        std::vector<std::string> passThrough;
-        std::vector<std::string> userVmargs;
-    };
-    const std::vector<Case> cases = {
-        {"extensions around the own -vmargs",
-         {"-config", "x", "-bar", "-vmargs", "-Dv=1"},
-         {"-bar", "-foo"},
-         {"-Dv=1", "-Xmx1g"}},
-        {"no own -vmargs: all appended in order", {"-bar", "-config", "x"}, {"-bar", "-foo"}, {"-Xmx1g"}},
-        {"unknown name adds nothing", {"-config", "nothing", "-bar"}, {"-bar"}, {}},
-    };
-    const std::string props = "config.x.1=-foo\nconfig.x.2=-vmargs\nconfig.x.3=-Xmx1g\n";
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.name);
-        Sandbox sb;
-        sb.setupInstall("user", props, kLibPath);
-        LaunchResult r = sb.run(userRun(c.args));
-        ASSERT_EQ(r.status, 0) << r.describe();
-        EXPECT_EQ(r.child().argv, expectedArgs(sb, {"user", c.passThrough, c.userVmargs}));
-    }
-}
-
-// Debug output is decided on the effective arguments: "-debug" may come from
-// the launcher properties; "-restart" switches it off and keeps "-debug" away
-// from the child.
-TEST(CommandLine, DebugOutputFromTheEffectiveArguments) {
-    struct Case {
-        std::vector<std::string> args;
-        bool debug;
-    };
-    const std::vector<Case> cases = {
-        {{}, false},
-        {{"-config", "dbg"}, true},
-        {{"-debug"}, true},
-        {{"-restart", "-config", "dbg"}, false},
-    };
-    Sandbox sb;
-    sb.setupInstall("user", "config.dbg.1=-debug\n");
-    for (const auto& c : cases) {
-        SCOPED_TRACE(::testing::PrintToString(c.args));
-        LaunchResult r = sb.run(c.args);
-        ASSERT_EQ(r.status, 0) << r.describe();
-        bool logged = r.log.find("RLNCH0132I: ===== Begin Parameters =====") != std::string::npos;
-        EXPECT_EQ(logged, c.debug) << r.describe();
-        EXPECT_EQ(r.child().argIndex("-debug") != -1, c.debug);
-        EXPECT_EQ(r.terminal, "");
-    }
-}
-
-}  // namespace
 
 namespace {
 
@@ -243,8 +62,10 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         sb.installStub(jvm2);
         sb.writeFile("inst/jvm2/jvm.properties", "-Dfrom.jvm=1\nvmarg.z=-Dvz=1\n");
 
-        RunOptions o = userRun({"-consoleLog", "-plugincustomization", "cmd.ini", "-resetconfig", "-foo", "-vm", jvm2,
-                                "-vmargs", "-Duser.vm=1"});
+        RunOptions o;
+        o.args = {"-consoleLog", "-plugincustomization", "cmd.ini", "-resetconfig", "-foo", "-vm", jvm2,
+                  "-vmargs", "-Duser.vm=1"};
+        o.env = {{"JAVA_HOME", "/opt/java"}, {"LD_LIBRARY_PATH", "/opt/inherited/lib"}};
         LaunchResult r = sb.run(o);
         ASSERT_EQ(r.status, 0) << r.describe();
         ASSERT_EQ(r.children.size(), 1u);
@@ -286,70 +107,75 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         env["LD_PRELOAD"] = "/nonexistent/libpre.so";
         EXPECT_EQ(r.child().env, env);
         EXPECT_EQ(withoutLoaderWarnings(r.terminal), "");
+        EXPECT_EQ(readText(r.workspace + "/.rcp.lock"), std::to_string(r.child().pid) + std::string(10, ' '));
     }
 }
 
-// The console options and a restart: "-console" keeps the console fix away
-// from the JVM and reaches the platform; a restart brings the fix back and
-// keeps "-console" and "-debug" away from the child. Without any library path
-// key the inherited LD_LIBRARY_PATH reaches the child unchanged, and with the
-// preload library behind a path with a blank the child is given a link of
-// its own under /tmp.
-TEST(CommandLine, ConsoleRestartAndPreloadLink) {
-    Sandbox sb;
-    const std::string lib = sb.path("my libs/libpre." + std::to_string(getpid()) + ".so");
-    sb.writeFile(lib, "");
-    const std::string link = "/tmp/kel.rcp.tester.ID42.libpre." + std::to_string(getpid()) + ".so";
-    unlink(link.c_str());
-    // The link outlives the launcher by design; this test removes it however
-    // it ends.
-    struct Unlink {
-        const std::string& path;
-        ~Unlink() { unlink(path.c_str()); }
-    } removeLink{link};
-    sb.setupInstall("user", "", "vmfix.noconsole=-Dfix=1\nlibrary.preload=" + lib + "\n");
+// The arguments from first (exclusive; "" = the program) up to last.
+std::vector<std::string> between(const ChildRecord& c, const std::string& first, const std::string& last) {
+    const int from = first.empty() ? 0 : c.argIndex(first), to = c.argIndex(last);
+    if (from < 0 || to <= from) return {"<missing " + first + " or " + last + ">"};
+    return std::vector<std::string>(c.argv.begin() + from + 1, c.argv.begin() + to);
+}
+
+// The effective arguments are the typed ones plus the '-config NAME'
+// extensions of the launcher properties (platform options before the typed
+// "-vmargs", VM options after the typed VM arguments). On them depend: debug
+// output ("-debug", even from the properties; never on a restart), the
+// console fix (left out with "-console" unless restarting), and whether the
+// launcher stays until its platform ends ("-rcpLauncherWait" or "-console",
+// not on a restart); a launcher that waited exits 0 whatever the platform's
+// status. Without library path keys the inherited LD_LIBRARY_PATH reaches
+// the child unchanged.
+TEST(CommandLine, EffectiveArguments) {
+    using V = std::vector<std::string>;
     struct Case {
-        std::vector<std::string> args;
-        bool fix;
-        std::vector<std::string> passed;  // launcher arguments the platform gets
+        V args, platform, vm;  // vm: the VM arguments before the configured ones
+        bool debug, waits;
     };
     const std::vector<Case> cases = {
-        {{"-console", "-debug"}, false, {"-console", "-debug"}},
-        {{"-console", "-debug", "-restart"}, true, {}},
-        {{"-consoleLog"}, true, {"-consoleLog"}},
+        {{"-config", "x", "-bar", "-vmargs", "-Dv=1"}, {"-bar", "-foo"}, {"-Dv=1", "-Xmx1g", "-Dfix=1"}, false, false},
+        {{"-bar", "-config", "x"}, {"-bar", "-foo"}, {"-Xmx1g", "-Dfix=1"}, false, false},
+        {{"-config", "nothing", "-bar"}, {"-bar"}, {"-Dfix=1"}, false, false},
+        {{"-config", "dbg"}, {"-debug"}, {"-Dfix=1"}, true, false},
+        {{"-debug"}, {"-debug"}, {"-Dfix=1"}, true, false},
+        {{"-restart", "-config", "dbg"}, {}, {"-Dfix=1"}, false, false},
+        {{"-console", "-debug"}, {"-console", "-debug"}, {}, true, true},
+        {{"-config", "con"}, {"-console"}, {}, false, true},
+        {{"-rcpLauncherWait"}, {"-rcpLauncherWait"}, {"-Dfix=1"}, false, true},
+        {{"-restart", "-console", "-debug"}, {}, {"-Dfix=1"}, false, false},
+        {{"-restart", "-rcpLauncherWait"}, {"-rcpLauncherWait"}, {"-Dfix=1"}, false, true},
+        {{"-consoleLog"}, {"-consoleLog"}, {"-Dfix=1"}, false, false},
     };
+    Sandbox sb;
+    sb.setupInstall("user",
+                    "config.x.1=-foo\nconfig.x.2=-vmargs\nconfig.x.3=-Xmx1g\n"
+                    "config.dbg.1=-debug\nconfig.con.1=-console\n",
+                    "vmfix.noconsole=-Dfix=1\n");
     for (const Case& c : cases) {
         SCOPED_TRACE(::testing::PrintToString(c.args));
         RunOptions o;
         o.args = c.args;
-        o.env = {{"LD_LIBRARY_PATH", "/opt/inherited/lib"}};
+        o.env = {{"RCP_STUB_SLEEP", "3"}, {"RCP_STUB_EXIT", "7"}, {"LD_LIBRARY_PATH", "/opt/inherited/lib"}};
+        o.keepChildren = true;
+        const auto start = std::chrono::steady_clock::now();
         LaunchResult r = sb.run(o);
+        const auto seconds =
+            std::chrono::duration_cast<std::chrono::seconds>(std::chrono::steady_clock::now() - start).count();
         ASSERT_EQ(r.status, 0) << r.describe();
+        ASSERT_EQ(r.children.size(), 1u);
         const ChildRecord& child = r.child();
-        std::vector<std::string> expected = {sb.eclipse()};
-        expected.insert(expected.end(), c.passed.begin(), c.passed.end());
-        const std::string ws = sb.defaultWorkspace();
-        for (const std::string& a : {std::string("-data"), ws, std::string("-configuration"), sb.defaultConfig(),
-                                     std::string("-application"), std::string("com.kel.demo.app"),
-                                     std::string("-vm"), sb.jvm(), std::string("-startup"),
-                                     sb.base() + "/launcher.jar", std::string("-vmargs")})
-            expected.push_back(a);
-        if (c.fix) expected.push_back("-Dfix=1");
-        for (const std::string& a :
-             {std::string("-Dvmarg.one=1"), "-Drcp.home=" + sb.inst(), "-Drcp.data=" + ws,
-              std::string("-Dcom.kel.rcp.install.id=ID42"), std::string("-Drcp.install.config=user"),
-              std::string("-Dbase.prop=one"), "-Drcp.osgi.install.area=" + sb.inst() + "/rcp/eclipse",
-              std::string("-Xmx256m"), std::string("-cp"), sb.inst() + "/lib/boot.jar",
-              std::string("-XstartOnFirstThread")})
-            expected.push_back(a);
-        EXPECT_EQ(child.argv, expected);
-        auto env = [&](const char* name) { return child.hasEnv(name) ? child.env.at(name) : "<unset>"; };
-        EXPECT_EQ(env("LD_LIBRARY_PATH"), "/opt/inherited/lib");
-        EXPECT_EQ(env("LD_PRELOAD"), link);
-        char target[4096];
-        ssize_t n = readlink(link.c_str(), target, sizeof target);
-        EXPECT_EQ(n < 0 ? "<no link>" : std::string(target, static_cast<size_t>(n)), lib);
-        EXPECT_EQ(withoutLoaderWarnings(r.terminal), "");
+        EXPECT_EQ(child.argv.at(0), sb.eclipse());
+        EXPECT_EQ(between(child, "", "-data"), c.platform);
+        EXPECT_EQ(between(child, "-vmargs", "-Dvmarg.one=1"), c.vm);
+        EXPECT_EQ(child.argv.back(), "-XstartOnFirstThread");
+        EXPECT_EQ(child.env.at("LD_LIBRARY_PATH"), "/opt/inherited/lib");
+        EXPECT_EQ(r.log.find("RLNCH0132I: ===== Begin Parameters =====") != std::string::npos, c.debug) << r.log;
+        // A launcher that waited has also reaped its platform.
+        EXPECT_EQ(kill(static_cast<pid_t>(child.pid), 0) == -1 && errno == ESRCH, c.waits);
+        EXPECT_EQ(seconds >= 3, c.waits) << seconds << " s";
+        EXPECT_EQ(r.terminal, "");
+        sb.killChildren();
     }
 }
 

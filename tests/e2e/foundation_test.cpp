@@ -88,25 +88,34 @@ TEST(Foundation, LauncherOutsideAnRcpDirectoryHasNoInstallation) {
 }
 
 // Failures before the log directory is known leave their line in the
-// fallback log and create nothing in the user's home.
-TEST(Foundation, EarlyFailuresGoToTheFallbackLog) {
+// fallback log and create nothing in the user's home. An install
+// configuration the launcher does not know cannot be named to the platform,
+// and a missing one cannot be written into the user's installation
+// properties: those end in the user's log, without a child.
+TEST(Foundation, EarlyFailuresEndWithTheirMessage) {
     struct Case {
-        const char* name;
-        std::string launcherProps;  // "" = no launcher properties file
+        std::string launcherProps;  // "-" = no launcher properties file
         std::string message;        // "%P" stands for the launcher properties path
+        bool inTmpLog;
     };
+    const std::string unknown = "RLNCH0025E: The platform rcp.install.id must be provided for this configuration!";
     const std::vector<Case> cases = {
-        {"no launcher properties", "", "RLNCH0014E: Unable to load %P file!"},
-        {"no base location", "rcp.install.id=ID42\njvm.location=/j\ninstall.configuration=user\n",
-         "RLNCH0050E: rcp.base.location property is missing from %P"},
-        {"no install id", "rcp.base.location=${rcp.home}/base\ninstall.configuration=user\n",
-         "RLNCH0016E: rcp.install.id is required for this configuration!"},
+        {"-", "RLNCH0014E: Unable to load %P file!", true},
+        {"rcp.install.id=ID42\njvm.location=/j\ninstall.configuration=user\n",
+         "RLNCH0050E: rcp.base.location property is missing from %P", true},
+        {"rcp.base.location=${rcp.home}/base\ninstall.configuration=user\n",
+         "RLNCH0016E: rcp.install.id is required for this configuration!", true},
+        {Sandbox::standardLauncherProperties("Lockdown"), unknown, false},
+        {Sandbox::standardLauncherProperties("provisioning"), unknown, false},
+        {Sandbox::standardLauncherProperties("user\t"), unknown, false},
+        {Sandbox::standardLauncherProperties(""),
+         "RLNCH0008E: Unable to calculate necessary values for user specific rcpinstall.properties file.", false},
     };
     for (const auto& c : cases) {
-        SCOPED_TRACE(c.name);
+        SCOPED_TRACE(c.launcherProps);
         Sandbox sb;
         sb.setupInstall("user");
-        if (c.launcherProps.empty()) unlink(sb.launcherProperties().c_str());
+        if (c.launcherProps == "-") unlink(sb.launcherProperties().c_str());
         else sb.writeLauncherProperties(c.launcherProps);
         std::string message = c.message;
         size_t p = message.find("%P");
@@ -115,11 +124,14 @@ TEST(Foundation, EarlyFailuresGoToTheFallbackLog) {
         LaunchResult r = sb.run({"-debug"});
         EXPECT_EQ(r.status, 255);
         EXPECT_FALSE(r.hasChild());
-        std::vector<std::string> lines = logLines(r.tmpLog);
-        ASSERT_FALSE(lines.empty());
+        EXPECT_EQ(r.tmpLogWritten, c.inTmpLog);
+        std::vector<std::string> lines = logLines(c.inTmpLog ? r.tmpLog : r.log);
+        ASSERT_FALSE(lines.empty()) << r.describe();
         // With "-debug" the queued debug lines come first; the fatal one ends it.
         EXPECT_TRUE(isErrorLine(lines.back(), message)) << r.describe();
-        EXPECT_TRUE(listTree(sb.home()).empty());
+        if (c.inTmpLog) {
+            EXPECT_TRUE(listTree(sb.home()).empty());
+        }
         EXPECT_EQ(r.terminal, "");
     }
 }

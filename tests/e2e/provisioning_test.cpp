@@ -1,7 +1,8 @@
 // Provisioning launches: a user's first launch, a new manifest level and the
 // installer's request each run the provisioning child in its own command-line
 // order, wait for it, release the lock and exit without starting the
-// platform; an unchanged level starts the platform as usual.
+// platform; an unchanged level starts the platform as usual, and so does a
+// launcher that finds a platform running.
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <unistd.h>
@@ -106,6 +107,26 @@ TEST(Provisioning, LaunchSequence) {
         EXPECT_EQ(disabled.child().argIndex("com.kel.provision"), -1);
         EXPECT_EQ(disabled.child().argv.back(), "-XstartOnFirstThread");
         EXPECT_FALSE(pathExists(shared + "/cache.bin"));
+
+        // Only the main launcher provisions: one that finds a platform
+        // running (this test process stands for it) starts a normal child
+        // handed to it, even at a new level, and leaves the lock and the
+        // startup record alone.
+        sb.writeLauncherProperties(Sandbox::standardLauncherProperties(configuration) +
+                                   "provisioning=true\nprovisioning.manifest.version=4\n");
+        const std::string runningPid = std::to_string(getpid());
+        writeText(lock, runningPid);
+        const FileState record = fileState(sb.defaultConfig() + "/args.properties");
+        LaunchResult secondary = sb.run();
+        ASSERT_EQ(secondary.status, 0) << secondary.describe();
+        ASSERT_EQ(secondary.children.size(), 1u);
+        EXPECT_EQ(secondary.child().argIndex("com.kel.provision"), -1);
+        EXPECT_EQ(secondary.child().argIndex("-userProvLaunch"), -1);
+        // The hand-over follows the JVM: "-vm <jvm> -useDaemon <pid>".
+        EXPECT_EQ(secondary.child().argAfter(sb.jvm()), "-useDaemon");
+        EXPECT_EQ(secondary.child().argAfter("-useDaemon"), runningPid);
+        EXPECT_EQ(readText(lock), runningPid);
+        EXPECT_TRUE(fileState(sb.defaultConfig() + "/args.properties") == record);
     }
 }
 

@@ -7,10 +7,10 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <chrono>
 #include <cstdlib>
+#include <sstream>
 #include <stdexcept>
 #include <thread>
 
@@ -23,39 +23,20 @@ const char* const kEquinoxLauncherInInstall = "eclipse/plugins/org.eclipse.equin
 
 namespace {
 
-const char* const kBundleName = "com.kel.demo.report_1.0.0";
-
-bool isExecutableFile(const std::string& path) {
-    struct stat st;
-    return stat(path.c_str(), &st) == 0 && S_ISREG(st.st_mode) && access(path.c_str(), X_OK) == 0;
-}
-
-// The names in dir that begin with prefix and end in suffix, sorted.
-std::vector<std::string> namesIn(const std::string& dir, const std::string& prefix, const std::string& suffix) {
-    std::vector<std::string> out;
-    DIR* d = opendir(dir.c_str());
-    if (!d) return out;
-    while (dirent* e = readdir(d)) {
-        std::string n = e->d_name;
-        if (n.size() > prefix.size() + suffix.size() && n.compare(0, prefix.size(), prefix) == 0 &&
-            n.compare(n.size() - suffix.size(), suffix.size(), suffix) == 0)
-            out.push_back(n);
-    }
-    closedir(d);
-    std::sort(out.begin(), out.end());
-    return out;
-}
-
-// The newest "<stem>_<version>.jar" of a plugins directory (by name order,
-// which is good enough for one installed version), or "".
+// The last "<stem>_<version>.jar" of a plugins directory in name order
+// (good enough for one installed version), or "".
 std::string pluginJar(const std::string& dir, const std::string& stem) {
-    std::vector<std::string> names = namesIn(dir, stem + "_", ".jar");
-    return names.empty() ? "" : dir + "/" + names.back();
-}
-
-std::string baseName(const std::string& path) {
-    size_t slash = path.rfind('/');
-    return slash == std::string::npos ? path : path.substr(slash + 1);
+    std::string found;
+    if (DIR* d = opendir(dir.c_str())) {
+        while (dirent* e = readdir(d)) {
+            std::string n = e->d_name;
+            if (n.size() > stem.size() + 5 && n.compare(0, stem.size() + 1, stem + "_") == 0 &&
+                n.compare(n.size() - 4, 4, ".jar") == 0 && n > found)
+                found = n;
+        }
+        closedir(d);
+    }
+    return found.empty() ? "" : dir + "/" + found;
 }
 
 void copyFile(const std::string& from, const std::string& to) {
@@ -68,26 +49,20 @@ void copyFile(const std::string& from, const std::string& to) {
 
 std::string findOnPath(const std::string& name) {
     const char* path = getenv("PATH");
-    std::string dirs = path ? path : "/usr/bin:/bin";
-    size_t start = 0;
-    while (start <= dirs.size()) {
-        size_t end = dirs.find(':', start);
-        if (end == std::string::npos) end = dirs.size();
-        std::string dir = dirs.substr(start, end - start);
-        if (dir.empty()) dir = ".";
-        std::string candidate = dir + "/" + name;
-        if (isExecutableFile(candidate)) return candidate;
-        start = end + 1;
+    std::stringstream dirs(path ? path : "/usr/bin:/bin");
+    for (std::string dir; std::getline(dirs, dir, ':');) {
+        struct stat st;
+        std::string candidate = (dir.empty() ? "." : dir) + "/" + name;
+        if (stat(candidate.c_str(), &st) == 0 && S_ISREG(st.st_mode) && access(candidate.c_str(), X_OK) == 0)
+            return candidate;
     }
     return "";
 }
 
 ProgramResult runProgram(const std::vector<std::string>& argv, int timeoutSeconds) {
     ProgramResult res;
-    if (argv.empty()) return res;
     TempDir tmp;
-    std::string outName = tmp.sub("output");
-
+    const std::string outName = tmp.sub("output");
     std::vector<std::string> store = argv;
     std::vector<char*> args;
     for (auto& a : store) args.push_back(&a[0]);
@@ -140,13 +115,13 @@ EquinoxJars findEquinox() {
 
 void installEquinox(const EquinoxJars& jars, const std::string& installDir) {
     copyFile(jars.launcher, installDir + "/" + kEquinoxLauncherInInstall);
-    copyFile(jars.framework, installDir + "/eclipse/plugins/" + baseName(jars.framework));
+    copyFile(jars.framework, installDir + "/eclipse/plugins/" + jars.framework.substr(jars.framework.rfind('/') + 1));
 }
 
 bool buildDemoBundle(const std::string& javac, const EquinoxJars& jars, const std::string& installDir,
                      std::string& log) {
     const std::string source = std::string(RCP_SOURCE_DIR) + "/demo/bundle";
-    const std::string dest = installDir + "/eclipse/plugins/" + kBundleName;
+    const std::string dest = installDir + "/eclipse/plugins/com.kel.demo.report_1.0.0";
     makeDirs(dest);
     std::vector<std::string> cmd = {javac, "--release", "11", "-nowarn", "-encoding", "UTF-8",
                                     "-cp", jars.framework, "-d", dest};
@@ -162,10 +137,6 @@ bool buildDemoBundle(const std::string& javac, const EquinoxJars& jars, const st
     if (r.status != 0) return false;
     copyFile(source + "/META-INF/MANIFEST.MF", dest + "/META-INF/MANIFEST.MF");
     return true;
-}
-
-std::string demoReportPath(const std::string& configurationArea) {
-    return configurationArea + "/com.kel.demo.report/report.properties";
 }
 
 std::map<std::string, std::string> parseReport(const std::string& text) {

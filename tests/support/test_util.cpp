@@ -1,7 +1,6 @@
 #include "test_util.h"
 
 #include <dirent.h>
-#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -31,30 +30,18 @@ std::string TempDir::sub(const std::string& rel) const { return path_ + "/" + re
 std::wstring TempDir::wsub(const std::string& rel) const { return widen(sub(rel)); }
 
 void makeDirs(const std::string& path) {
-    std::string cur;
-    std::stringstream ss(path);
-    std::string part;
-    if (!path.empty() && path[0] == '/') cur = "";
-    while (std::getline(ss, part, '/')) {
-        if (part.empty()) continue;
-        cur += "/" + part;
-        mkdir(cur.c_str(), 0755);
-    }
+    for (size_t slash = path.find('/', 1); slash != std::string::npos; slash = path.find('/', slash + 1))
+        mkdir(path.substr(0, slash).c_str(), 0755);
+    mkdir(path.c_str(), 0755);
 }
 
 void writeText(const std::string& path, const std::string& text, int mode) {
     size_t slash = path.rfind('/');
     if (slash != std::string::npos && slash > 0) makeDirs(path.substr(0, slash));
     unlink(path.c_str());
-    int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
-    if (fd < 0) throw std::runtime_error("cannot write " + path);
-    size_t off = 0;
-    while (off < text.size()) {
-        ssize_t n = write(fd, text.data() + off, text.size() - off);
-        if (n <= 0) break;
-        off += static_cast<size_t>(n);
-    }
-    close(fd);
+    std::ofstream out(path, std::ios::binary);
+    if (!(out << text) || !out.flush()) throw std::runtime_error("cannot write " + path);
+    out.close();
     chmod(path.c_str(), static_cast<mode_t>(mode));
 }
 
@@ -70,7 +57,6 @@ bool pathExists(const std::string& path) {
     struct stat st;
     return lstat(path.c_str(), &st) == 0;
 }
-
 bool isDir(const std::string& path) {
     struct stat st;
     return lstat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
