@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
-# Builds and runs every test: a normal build with warnings as errors, the same
-# suite under AddressSanitizer + UndefinedBehaviorSanitizer, and short bounded
+# Builds and runs every test: a normal build with warnings as errors, its
+# end-to-end suite once more with the launcher under valgrind, the same suite
+# under AddressSanitizer + UndefinedBehaviorSanitizer, and short bounded
 # fuzzing runs built with clang.
 set -euo pipefail
 cd "$(dirname "$0")/.."
@@ -16,6 +17,14 @@ echo "=== Normal build (-Wall -Wextra -Werror) ==="
 cmake -S "$root" -B "$root/build" -DRCP_WERROR=ON -DRCP_SANITIZE=OFF -DRCP_BENCHMARKS=ON >/dev/null
 cmake --build "$root/build" -j"$jobs"
 (cd "$root/build" && ctest --output-on-failure)
+
+if [ "$(uname -s)" = Darwin ]; then
+  echo "=== valgrind skipped on macOS ==="
+else
+  # The end-to-end suite again with every launcher under memcheck; the race
+  # and kill tests run fewer rounds there (each launch takes a second).
+  RCP_RACE_ROUNDS=1 RCP_KILL_ROUNDS=5 scripts/valgrind-e2e.sh "$root/build"
+fi
 
 echo "=== Sanitizer build (address, undefined) ==="
 cmake -S "$root" -B "$root/build-asan" -DRCP_WERROR=ON -DRCP_SANITIZE=ON >/dev/null

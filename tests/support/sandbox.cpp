@@ -296,7 +296,12 @@ void Sandbox::writeBase(const std::string& rel, const std::string& text) const {
 
 void Sandbox::installStub(const std::string& where) const { copyExecutable(RCP_STUB_CHILD, where); }
 
-void Sandbox::installLauncher(const std::string& where) const { copyExecutable(RCP_LAUNCHER_BINARY, where); }
+void Sandbox::installLauncher(const std::string& where) const {
+    // A launcher given in the environment (e.g. one that valgrind can fully
+    // instrument) replaces the one built with the tests.
+    const char* binary = getenv("RCP_LAUNCHER_BINARY");
+    copyExecutable(binary && *binary ? binary : RCP_LAUNCHER_BINARY, where);
+}
 
 std::string Sandbox::standardLauncherProperties(const std::string& configuration) {
     std::string text =
@@ -372,6 +377,11 @@ std::vector<ChildRecord> Sandbox::collectRecords(int expected, int timeoutSecond
         if (!pathExists(name)) break;
         ChildRecord r;
         if (!parseChildRecord(readText(name), r)) throw std::runtime_error("malformed child record " + name);
+        // valgrind removes its own preload library from the environment of
+        // the programs its client starts, leaving LD_PRELOAD set but empty;
+        // for the loader that is the same as not set.
+        auto preload = r.env.find("LD_PRELOAD");
+        if (!launcherWrapper().empty() && preload != r.env.end() && preload->second.empty()) r.env.erase(preload);
         records.push_back(r);
     }
     return records;

@@ -23,6 +23,8 @@
 // words, e.g. "valgrind -q --error-exitcode=99"), every launcher runs under
 // that command: the wrapper is executed with the launcher's path and
 // arguments appended (found on the test's PATH unless it holds a slash).
+// RCP_LAUNCHER_BINARY, when set, names the launcher program that sandboxes
+// install instead of the one built with the tests.
 #ifndef RCP_SANDBOX_H
 #define RCP_SANDBOX_H
 
