@@ -88,6 +88,19 @@ struct Fault {
     int err;         // the errno the error line reports
 };
 
+const int kAnyErrno = -1;
+
+// A first launch, then "-resetconfig"; for a user, the workspace becomes
+// root's (and not writable for others) while all in it is the user's.
+void resetAfterFirstLaunch(Sandbox& sb, RunOptions& o, bool lockWorkspace) {
+    ASSERT_EQ(sb.run().status, 0);
+    o.args = {"-resetconfig"};
+    if (!lockWorkspace) return;
+    chownTree(sb.defaultWorkspace(), kNobody);
+    ASSERT_EQ(chown(sb.defaultWorkspace().c_str(), 0, 0), 0);
+    ASSERT_EQ(chmod(sb.defaultWorkspace().c_str(), 0755), 0);
+}
+
 std::string expand(std::string text, const Sandbox& sb) {
     const std::map<std::string, std::string> names = {
         {"%W", sb.defaultWorkspace()}, {"%C", sb.defaultConfig()}, {"%S", sb.root()}, {"%P", sb.launcherProperties()}};
@@ -155,6 +168,29 @@ TEST(Faults, UnwritableAreasEndWithTheirMessage) {
              ASSERT_EQ(chmod(sb.launcherProperties().c_str(), 0444), 0);
          },
          "RLNCH0017E: Could not open %P to append rcp.install.id!", EACCES},
+        // A reset moves the configuration area to "<area>bak" after removing
+        // an older backup; when either cannot be done the area stays as it
+        // was. Removing a tree follows links (the data areas are not meant to
+        // hold any), so a dangling link cannot be examined and stays: root
+        // meets a backup it cannot remove. For a user, a workspace directory
+        // that is not writable refuses both the removal and the rename.
+        {"reset meets an old backup holding a dangling link", false, false,
+         [](Sandbox& sb, RunOptions& o) {
+             resetAfterFirstLaunch(sb, o, false);
+             makeDirs(sb.defaultConfig() + "bak");
+             ASSERT_EQ(symlink("/nonexistent/target", (sb.defaultConfig() + "bak/dangling").c_str()), 0);
+         },
+         "RLNCH0084E end: Unable to remove all files in the old directory. Please correct the problems listed above",
+         kAnyErrno},
+        {"reset meets an old backup file the user may not delete", true, false,
+         [](Sandbox& sb, RunOptions& o) {
+             resetAfterFirstLaunch(sb, o, true);
+             writeText(sb.defaultConfig() + "bak", "old\n");
+         },
+         "RLNCH0111E: Can't delete old copy of file '%Cbak'", EACCES},
+        {"reset in a workspace that does not let the user rename the area", true, false,
+         [](Sandbox& sb, RunOptions& o) { resetAfterFirstLaunch(sb, o, true); },
+         "RLNCH0112E: Can't move file/dir  '%C'", EACCES},
     };
 
     for (const Fault& f : faults) {
@@ -177,92 +213,11 @@ TEST(Faults, UnwritableAreasEndWithTheirMessage) {
         EXPECT_FALSE(r.hasChild());
         EXPECT_EQ(r.terminal, "");
         EXPECT_EQ(r.tmpLogWritten, f.inTmpLog) << r.describe();
-        EXPECT_EQ(lastLine(f.inTmpLog ? r.tmpLog : r.log), errorLine(expand(f.message, sb), f.err)) << r.describe();
+        const std::string last = lastLine(f.inTmpLog ? r.tmpLog : r.log);
+        if (f.err == kAnyErrno) EXPECT_TRUE(isErrorLine(last, expand(f.message, sb))) << r.describe();
+        else EXPECT_EQ(last, errorLine(expand(f.message, sb), f.err)) << r.describe();
         expectKept(homeBefore, sb.home());
         expectKept(instBefore, sb.inst());
-    }
-}
-
-// A reset moves the configuration area to "<area>bak" after removing an
-// older backup. When either cannot be done the launch ends with the
-// matching message, and the area itself is left exactly as it was.
-TEST(Faults, ResetThatCannotSetTheAreaAsideLeavesTheAreaAlone) {
-    struct Case {
-        const char* name;
-        bool asNobody;
-        std::function<void(Sandbox&)> prepare;
-        std::function<std::vector<std::string>(const Sandbox&)> lines;  // the log's last lines
-    };
-    // Removing a tree follows links (the data areas are not meant to hold
-    // any), so a dangling link cannot be examined and stays: root meets a
-    // backup it cannot remove. For a user, a workspace directory that is not
-    // writable refuses both the removal of the old backup and the rename.
-    auto lockWorkspace = [](Sandbox& sb) {
-        chownTree(sb.defaultWorkspace(), kNobody);
-        ASSERT_EQ(chown(sb.defaultWorkspace().c_str(), 0, 0), 0);
-        ASSERT_EQ(chmod(sb.defaultWorkspace().c_str(), 0755), 0);
-    };
-    const std::vector<Case> cases = {
-        {"old backup holds a dangling link", false,
-         [](Sandbox& sb) {
-             makeDirs(sb.defaultConfig() + "bak");
-             ASSERT_EQ(symlink("/nonexistent/target", (sb.defaultConfig() + "bak/dangling").c_str()), 0);
-         },
-         [](const Sandbox& sb) {
-             return std::vector<std::string>{
-                 "RLNCH0083E begin: Error removing old directory",
-                 "Can't stat " + sb.defaultConfig() + "bak/dangling  -  Failed with error 2: " + strerror(ENOENT),
-                 "RLNCH0084E end: Unable to remove all files in the old directory. Please correct the problems listed "
-                 "above"};
-         }},
-        {"old backup is a file the user may not delete", true,
-         [&](Sandbox& sb) {
-             writeText(sb.defaultConfig() + "bak", "old\n");
-             lockWorkspace(sb);
-         },
-         [](const Sandbox& sb) {
-             return std::vector<std::string>{
-                 errorLine("RLNCH0111E: Can't delete old copy of file '" + sb.defaultConfig() + "bak'", EACCES)};
-         }},
-        {"workspace does not let the user rename the area", true, [&](Sandbox& sb) { lockWorkspace(sb); },
-         [](const Sandbox& sb) {
-             return std::vector<std::string>{
-                 errorLine("RLNCH0112E: Can't move file/dir  '" + sb.defaultConfig() + "'", EACCES)};
-         }},
-    };
-    for (const Case& c : cases) {
-        SCOPED_TRACE(c.name);
-        if (c.asNobody && geteuid() != 0) {
-            std::cout << "skipped (needs root to run the launcher as nobody): " << c.name << "\n";
-            continue;
-        }
-        Sandbox sb;
-        sb.setupInstall("user");
-        LaunchResult first = sb.run();
-        ASSERT_EQ(first.status, 0) << first.describe();
-        c.prepare(sb);
-        if (::testing::Test::HasFatalFailure()) return;
-        const auto before = userFiles(sb.defaultConfig());
-        ASSERT_EQ(before.size(), 4u);
-
-        RunOptions o;
-        o.args = {"-resetconfig"};
-        if (c.asNobody) o.uid = o.gid = kNobody;
-        LaunchResult r = sb.run(o);
-        EXPECT_EQ(r.status, 255) << r.describe();
-        EXPECT_FALSE(r.hasChild());
-        EXPECT_EQ(r.terminal, "");
-        std::vector<std::string> expected = c.lines(sb);
-        std::vector<std::string> lines = logLines(r.log);
-        ASSERT_GE(lines.size(), expected.size()) << r.describe();
-        std::vector<std::string> tail(lines.end() - static_cast<long>(expected.size()), lines.end());
-        if (expected.size() > 1) {
-            // The closing line carries the system's text like every error line.
-            EXPECT_TRUE(isErrorLine(tail.back(), expected.back())) << tail.back();
-            tail.back() = expected.back();
-        }
-        EXPECT_EQ(tail, expected) << r.describe();
-        expectKept(before, sb.defaultConfig());
     }
 }
 

@@ -102,19 +102,6 @@ protected:
         }
     }
 
-    // The command line the launcher logged (with -debug) between its markers.
-    static std::vector<std::string> loggedCommandLine(const std::string& log) {
-        std::vector<std::string> lines = splitLines(log);
-        std::vector<std::string> out;
-        bool inside = false;
-        for (const auto& l : lines) {
-            if (l == kBeginParameters) inside = true;
-            else if (l == kEndParameters) inside = false;
-            else if (inside) out.push_back(l);
-        }
-        return out;
-    }
-
     Sandbox sb_;
     std::string java_;
     EquinoxJars jars_;
@@ -145,7 +132,10 @@ TEST_F(RealPlatform, PlatformRunsWithWhatTheLauncherComputed) {
     ASSERT_FALSE(r.timedOut) << r.describe();
     ASSERT_EQ(r.status, 0) << r.describe();
     const std::vector<std::string> cmd = expectedCommandLine(typed, typedVmargs);
-    EXPECT_EQ(loggedCommandLine(r.log), cmd) << r.log;
+    // With "-debug" the launcher logs the command line, one argument a line.
+    std::string logged = kBeginParameters + std::string("\n");
+    for (const auto& a : cmd) logged += a + "\n";
+    EXPECT_NE(r.log.find(logged + kEndParameters + "\n"), std::string::npos) << r.log;
 
     // "-debug" reached the platform as well: Equinox names the areas it uses.
     EXPECT_NE(r.terminal.find("Configuration location:\n    file:" + configuration() + "/\n"), std::string::npos)

@@ -133,12 +133,6 @@ TEST(SharedTmp, PreloadLinkIsOnlyEverOurOwn) {
              ASSERT_EQ(chown(linkPath.c_str(), kNobody, kNobody), 0);
          },
          false},
-        {"another user's directory", false,
-         [&](const std::string&, const std::string&) {
-             ASSERT_EQ(mkdir(linkPath.c_str(), 0777), 0);
-             ASSERT_EQ(chown(linkPath.c_str(), kNobody, kNobody), 0);
-         },
-         false},
         {"root's link to another file, launcher run by a user", true,
          [&](const std::string&, const std::string& victim) { plantLink(victim, 0); }, false},
     };
