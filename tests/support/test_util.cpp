@@ -17,10 +17,8 @@ namespace rcptest {
 TempDir::TempDir() {
     const char* base = getenv("TMPDIR");
     std::string tmpl = std::string(base && *base ? base : "/tmp") + "/rcptest.XXXXXX";
-    std::vector<char> buf(tmpl.begin(), tmpl.end());
-    buf.push_back('\0');
-    if (!mkdtemp(buf.data())) throw std::runtime_error("mkdtemp failed");
-    path_ = buf.data();
+    if (!mkdtemp(&tmpl[0])) throw std::runtime_error("mkdtemp failed");
+    path_ = tmpl;
 }
 
 TempDir::~TempDir() { removeTree(path_); }
