@@ -151,4 +151,36 @@ inline constexpr const char* USER_IN_ENV_STRINGA = "USER";
 inline constexpr const char* LD_PRELOAD_ENV_VAR_A = "LD_PRELOAD";
 inline constexpr const char* DOT_CHARA = ".";
 
+// ---- Texts of single modules ----
+// Placeholder syntax
+inline constexpr const wchar_t* PH_OPEN = L"${";
+inline constexpr wchar_t PH_CLOSE = L'}';
+inline constexpr const wchar_t* ENV_PREFIX = L"env.";
+inline constexpr const wchar_t* PROP_PREFIX = L"prop.";
+// Properties line format: skip white space (blank lines too), at most 2024 bytes
+inline constexpr const wchar_t* PROP_LINE_FORMAT = L" %2024[^\n]\n";
+// Template sub-folders below <core>/config and the startup record keys
+inline constexpr const wchar_t* CORE_CONFIG_DIR = L"config";
+inline constexpr const wchar_t* CORE_SUBDIR_MUSERVICE = L"muservice";
+inline constexpr const wchar_t* CORE_SUBDIR_USER = L"user";
+inline constexpr const wchar_t* CORE_SUBDIR_PBUILDER = L"pbuilder";
+inline constexpr const wchar_t* ARG_KEY_PREFIX = L"arg";
+inline constexpr const wchar_t* ARGC_KEY = L"argc";
+// Reset: saved copies, the backup suffix and the plug-in state directory
+inline constexpr const wchar_t* REGISTRY_FILE = L"registry";
+inline constexpr const wchar_t* REGISTRY_SAVED = L"registry.old";
+inline constexpr const wchar_t* PLATFORM_XML_SAVED = L"platform.xml.old";
+inline constexpr const wchar_t* BACKUP_SUFFIX = L"bak";
+inline constexpr const wchar_t* METADATA_DIR = L".metadata";
+inline constexpr const wchar_t* PLUGINS_DIR = L".plugins";
+// Per-user files: work names (".base": the plain copy of the base file while
+// the per-user file is being made), the line written for a JVM feature, and
+// the template line format (at most 2024 bytes; the trailing "\n" swallows
+// the line end and all white space after it, so blank lines and indentation
+// vanish).
+inline constexpr const wchar_t* WORK_FILE_SUFFIX = L".new";
+inline constexpr const wchar_t* BASE_COPY_SUFFIX = L".base";
+inline constexpr const wchar_t* FEATURE_LINE = L"<feature>";
+inline constexpr const wchar_t* LINE_SCAN_FORMAT = L"%2024[^\n]\n";
+
 #endif  // RCP_LAUNCHER_CONSTANTS_H

@@ -11,11 +11,6 @@
 
 namespace {
 
-const wchar_t* const PH_OPEN = L"${";
-const wchar_t PH_CLOSE = L'}';
-const wchar_t* const ENV_PREFIX = L"env.";    // 4 characters
-const wchar_t* const PROP_PREFIX = L"prop.";  // 5 characters
-
 // A placeholder that keeps coming back at the same or a later position is a
 // value that contains itself.
 const int MAX_PLACEHOLDER_CYCLES = 10;

@@ -21,10 +21,6 @@
 
 namespace {
 
-// Format of one properties line: skip all white space (blank lines included)
-// and take at most 2024 bytes up to the line end.
-const wchar_t* const PROP_LINE_FORMAT = L" %2024[^\n]\n";
-
 // Closes every array returned by findProperties.
 wchar_t emptyEntry[1] = {0};
 

@@ -16,14 +16,6 @@ namespace {
 
 // Template files live below <core>/config/<sub-folder>; the sub-folder
 // depends on the install configuration.
-constexpr const wchar_t* CORE_CONFIG_DIR = L"config";
-constexpr const wchar_t* CORE_SUBDIR_MUSERVICE = L"muservice";
-constexpr const wchar_t* CORE_SUBDIR_USER = L"user";
-constexpr const wchar_t* CORE_SUBDIR_PBUILDER = L"pbuilder";
-
-constexpr const wchar_t* ARG_KEY_PREFIX = L"arg";
-constexpr const wchar_t* ARGC_KEY = L"argc";
-
 const wchar_t* coreSubFolder() {
     switch (eConfig) {
         case multiuser_service:

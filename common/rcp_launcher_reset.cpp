@@ -12,13 +12,6 @@
 
 namespace {
 
-constexpr const wchar_t* REGISTRY_FILE = L"registry";
-constexpr const wchar_t* REGISTRY_SAVED = L"registry.old";
-constexpr const wchar_t* PLATFORM_XML_SAVED = L"platform.xml.old";
-constexpr const wchar_t* BACKUP_SUFFIX = L"bak";
-constexpr const wchar_t* METADATA_DIR = L".metadata";
-constexpr const wchar_t* PLUGINS_DIR = L".plugins";
-
 wstring joinPath(const wstring& dir, const wstring& name) {
     wstring path = dir;
     if (!name.empty()) path += L"/" + name;

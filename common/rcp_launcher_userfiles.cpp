@@ -10,19 +10,10 @@
 
 namespace {
 
-constexpr const wchar_t* WORK_FILE_SUFFIX = L".new";
-// The plain copy of the base file while the per-user file is being made.
-constexpr const wchar_t* BASE_COPY_SUFFIX = L".base";
-
 // The launcher properties without which the per-user file cannot be
 // completed (RLNCH0008E).
 constexpr const wchar_t* REQUIRED_LAUNCHER_VALUES[] = {RCP_INSTALL_ID_PROPERTY, JVM_LOCATION, RCP_BASE_LOC_PROPERTY,
                                                         CONFIGURATION_PROPERTY};
-constexpr const wchar_t* FEATURE_LINE = L"<feature>";
-
-// At most 2024 bytes of a line; the trailing "\n" swallows the line end and
-// all white space after it, so blank lines and indentation vanish.
-constexpr const wchar_t* LINE_SCAN_FORMAT = L"%2024[^\n]\n";
 
 // Reads the next line of a template. False at the end of the file, and also
 // when the scan matched nothing: that happens only at a line end the scan
