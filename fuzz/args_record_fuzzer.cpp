@@ -19,20 +19,7 @@
 
 namespace {
 
-// One line of the reader is at most 2024 bytes; a longer record line is
-// split by design, so only shorter ones must read back unchanged.
-const size_t MAX_LINE = 2024;
 const size_t MAX_ARGS = 64;
-
-std::wstring expectedReadBack(std::wstring v) {
-    size_t lead = 0;
-    while (lead < v.length() && (v[lead] == L' ' || v[lead] == L'=' || v[lead] == L':')) ++lead;
-    v.erase(0, lead);
-    size_t end = v.length();
-    while (end > 0 && v[end - 1] == L' ') --end;
-    v.erase(end);
-    return v;
-}
 
 // A directory of this process in /tmp for the record, removed at exit.
 const std::string& scratchDir() {
@@ -91,9 +78,9 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         std::wstring value = i == 0 ? launcherPath : args[static_cast<size_t>(i)];
         std::wstring line;
         convWcharTo8859_1(key, value, line);
-        if (line.length() > MAX_LINE) linesFit = false;
+        if (line.length() > rcpfuzz::MAX_LINE) linesFit = false;
         expected.push_back(key);
-        expected.push_back(i == 0 ? value : expectedReadBack(value));
+        expected.push_back(i == 0 ? value : rcpfuzz::expectedReadBack(value));
     }
     expected.push_back(L"argc");
     expected.push_back(std::to_wstring(n));

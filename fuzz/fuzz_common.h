@@ -45,6 +45,23 @@ inline void resetLog(bool debug) {
     setDebug(debug);
 }
 
+// One line of the reader is at most 2024 bytes; a longer written line is
+// split by design, so only shorter ones must read back unchanged.
+const size_t MAX_LINE = 2024;
+
+// What the reader gives back for a value the writer escaped: leading
+// separators and surrounding blanks are not part of a value, and the stored
+// copy ends at a NUL.
+inline std::wstring expectedReadBack(std::wstring v) {
+    size_t lead = 0;
+    while (lead < v.length() && (v[lead] == L' ' || v[lead] == L'=' || v[lead] == L':')) ++lead;
+    v.erase(0, lead);
+    size_t end = v.length();
+    while (end > 0 && v[end - 1] == L' ') --end;
+    v.erase(end);
+    return std::wstring(v.c_str());
+}
+
 }  // namespace rcpfuzz
 
 #endif  // RCP_FUZZ_COMMON_H

@@ -9,23 +9,6 @@
 
 #include "fuzz_common.h"
 
-namespace {
-
-// One line of the reader is at most 2024 bytes.
-const size_t MAX_LINE = 2024;
-
-std::wstring expectedReadBack(std::wstring v) {
-    size_t lead = 0;
-    while (lead < v.length() && (v[lead] == L' ' || v[lead] == L'=' || v[lead] == L':')) ++lead;
-    v.erase(0, lead);
-    size_t end = v.length();
-    while (end > 0 && v[end - 1] == L' ') --end;
-    v.erase(end);
-    return std::wstring(v.c_str());  // the stored copy ends at a NUL
-}
-
-}  // namespace
-
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     rcpfuzz::resetLog(false);
 
@@ -38,7 +21,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         const wchar_t c = static_cast<wchar_t>(data[i] | (data[i + 1] << 8));
         std::wstring escaped;
         convWcharTo8859_1_Value(std::wstring(1, c), escaped);
-        if (line.length() + escaped.length() > MAX_LINE) break;
+        if (line.length() + escaped.length() > rcpfuzz::MAX_LINE) break;
         line += escaped;
         value += c;
     }
@@ -63,7 +46,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     getProperties(path, props);
     FUZZ_CHECK(props.size() == 4);
     FUZZ_CHECK(key == props[0]);
-    FUZZ_CHECK(expectedReadBack(value) == props[1]);
+    FUZZ_CHECK(rcpfuzz::expectedReadBack(value) == props[1]);
     FUZZ_CHECK(wcscmp(props[2], L"next") == 0 && wcscmp(props[3], L"1") == 0);
     freeProperties(props);
     return 0;
