@@ -131,6 +131,9 @@ void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wc
                                int argc);
 // Frees the expanded copies; no argument vector may point to them afterwards.
 void releaseExpandedArgs();
+// Only the first "${rcp.home}": the base location's later ones are left to
+// the platform.
+void replaceFirstRcpHome(wstring& text, const wstring& installDir);
 
 // ===================== Install configuration (rcp_launcher_installcfg) =======
 bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArray, bool muservice);
@@ -149,6 +152,8 @@ void addStartupToCommandLine(std::vector<String> propArray, int argc, wchar_t** 
 void addClasspathToCommandLine(std::vector<String>& rcpInstallPropertiesArray);
 void addMainClassToCommandLine();
 void addUseDaemonToCommandLine();
+// "rcp.base.location" of props; RLNCH0011E when it is missing.
+wstring requireBaseLocation(const std::vector<String>& props);
 
 // ===================== VM arguments and system properties (rcp_launcher_cmdline)
 void setArgProperty(wstring& prop, const wchar_t* key, const wchar_t* value);

@@ -13,17 +13,6 @@ namespace {
 // The two configurations in which the JVM itself is the child's executable.
 bool jvmIsTheChild() { return eConfig == service || eConfig == multiuser_service; }
 
-// The base plug-in directory; every caller needs it, so its absence is fatal.
-wstring requireBaseLocation(const std::vector<String>& props) {
-    String baseLoc = findProperty(RCP_BASE_LOC_PROPERTY, props);
-    if (baseLoc == nullptr) {
-        fatalErrorA("RLNCH0011E: Unable to determine RCP Base Plugin location. If the problem persists, reinstall.",
-                    true);
-        return wstring();
-    }
-    return wstring(baseLoc);
-}
-
 // Shared by isJavaw and replaceJavaExecutableName: the path with its trailing
 // executable name swapped, or false when the path does not end with that name.
 bool swapExecutableName(const wstring& vmString, const wchar_t* from, const wchar_t* to, wstring& swapped) {
@@ -38,6 +27,17 @@ bool swapExecutableName(const wstring& vmString, const wchar_t* from, const wcha
 }
 
 }  // namespace
+
+// The base plug-in directory; every caller needs it, so its absence is fatal.
+wstring requireBaseLocation(const std::vector<String>& props) {
+    String baseLoc = findProperty(RCP_BASE_LOC_PROPERTY, props);
+    if (baseLoc == nullptr) {
+        fatalErrorA("RLNCH0011E: Unable to determine RCP Base Plugin location. If the problem persists, reinstall.",
+                    true);
+        return wstring();
+    }
+    return wstring(baseLoc);
+}
 
 void addVmToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
                         std::vector<String>& /*rcpLauncherPropertiesArray*/, int argc, wchar_t** argv) {

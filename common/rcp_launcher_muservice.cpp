@@ -9,20 +9,6 @@
 
 namespace {
 
-wstring baseLocationFromLauncherProps(const std::vector<String>& rcpLauncherPropertiesArray,
-                                      const wstring& installDir) {
-    String baseProp = findProperty(RCP_BASE_LOC_PROPERTY, rcpLauncherPropertiesArray);
-    if (baseProp == nullptr) {
-        fatalErrorA("RLNCH0011E: Unable to determine RCP Base Plugin location. If the problem persists, reinstall.",
-                    true);
-        return wstring();
-    }
-    wstring baseLocation(baseProp);
-    size_t pos = baseLocation.find(RCPHOME_REPLACE);
-    if (pos != wstring::npos) baseLocation.replace(pos, wcslen(RCPHOME_REPLACE), installDir);
-    return baseLocation;
-}
-
 void makeServiceDirectory(const wstring& dir) {
     if (isDirectory(dir.c_str())) return;
     if (!mkdirs(dir.c_str()) && !isDirectory(dir.c_str()))
@@ -65,7 +51,8 @@ void createMUServiceWkspc(wstring& workspaceLocation, const wstring& installDir,
     // Only the superuser or the service itself may write into the installation.
     if (!userIsAdmin(userName.c_str()) && eConfig != multiuser_service) return;
 
-    wstring baseLocation = baseLocationFromLauncherProps(rcpLauncherPropertiesArray, installDir);
+    wstring baseLocation = requireBaseLocation(rcpLauncherPropertiesArray);
+    replaceFirstRcpHome(baseLocation, installDir);
     workspaceLocation = installDir + MUSVC_WORKSPACE_LOC;
     wstring configLocation = installDir + MUSVC_CONFIG_LOC;
     makeServiceDirectory(workspaceLocation);

@@ -233,4 +233,9 @@ void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wc
     }
 }
 
+void replaceFirstRcpHome(wstring& text, const wstring& installDir) {
+    size_t pos = text.find(RCPHOME_REPLACE);
+    if (pos != wstring::npos) text.replace(pos, wcslen(RCPHOME_REPLACE), installDir);
+}
+
 void releaseExpandedArgs() { expandedArgs.release(); }

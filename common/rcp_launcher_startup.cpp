@@ -95,8 +95,7 @@ void readInstallationIdentity(Startup& s) {
                     s.rcp_launcher_properties_file.c_str(), true);
     s.coreLocation = base;
     // Only the first occurrence: later ones are the installer's business.
-    size_t home = s.coreLocation.find(RCPHOME_REPLACE);
-    if (home != wstring::npos) s.coreLocation.replace(home, wcslen(RCPHOME_REPLACE), s.installDir);
+    replaceFirstRcpHome(s.coreLocation, s.installDir);
 }
 
 // Workspace, log, platform lock, configuration area, in this order: the log

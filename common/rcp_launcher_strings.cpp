@@ -5,15 +5,24 @@
 
 #include "rcp_launcher.h"
 
-String newString(unsigned long len) {
+namespace {
+
+// Room for len characters and the terminator, already a valid empty string.
+String allocString(unsigned long len, const char* failureMessage) {
     String s = static_cast<String>(malloc((len + 1) * sizeof(wchar_t)));
     if (s == nullptr) {
-        fatalErrorA("RLNCH0004E: newString malloc failed!", true);
+        fatalErrorA(failureMessage, true);
         return nullptr;
     }
     s[0] = 0;
     return s;
 }
+
+}  // namespace
+
+String newString(unsigned long len) { return allocString(len, "RLNCH0004E: newString malloc failed!"); }
+
+String mallocString(unsigned long len) { return allocString(len, "RLNCH0004E: mallocString malloc failed!"); }
 
 String freeString(String s) {
     if (s != nullptr) free(s);

@@ -106,16 +106,6 @@ void replaceAll(std::wstring& in, wchar_t from, wchar_t to) {
 
 }  // namespace
 
-String mallocString(unsigned long len) {
-    String s = static_cast<String>(malloc((len + 1) * sizeof(wchar_t)));
-    if (s == nullptr) {
-        fatalErrorA("RLNCH0004E: mallocString malloc failed!", true);
-        return nullptr;
-    }
-    s[0] = 0;
-    return s;
-}
-
 String chartowcs(const char* cs) {
     std::wstring wide;
     decodeMultibyte(cs, wide);
