@@ -12,6 +12,13 @@
 
 namespace {
 
+// Removes a whole tree; what could not be removed is listed in the one fatal
+// message, whose "%ls" receives the list.
+void removeTreeOrFail(const wstring& dir, const char* message) {
+    wstring errlist;
+    if (!removeDirectoryAndContents(dir, errlist)) fatalErrorA(message, errlist.c_str(), true);
+}
+
 wstring joinPath(const wstring& dir, const wstring& name) {
     wstring path = dir;
     if (!name.empty()) path += L"/" + name;
@@ -79,15 +86,10 @@ void handleCopy(const wstring& dstdir, const wstring& dstname, const wstring& sr
                 return;
             }
         } else {
-            wstring errlist;
-            if (!removeDirectoryAndContents(dst, errlist)) {
-                fatalErrorA(
-                    "\nRLNCH0083E begin: Error removing old directory\n%ls\n"
-                    "RLNCH0084E end: Unable to remove all files in the old directory. Please correct the problems "
-                    "listed above",
-                    errlist.c_str(), true);
-                return;
-            }
+            removeTreeOrFail(dst,
+                             "\nRLNCH0083E begin: Error removing old directory\n%ls\n"
+                             "RLNCH0084E end: Unable to remove all files in the old directory. Please correct the "
+                             "problems listed above");
         }
     }
 
@@ -143,15 +145,10 @@ void resetMetaDataDirs(const wstring& workspaceLocation, const wstring& configLo
         wstring dir = pluginsDir + value;
         convertToOsSeparator(dir);
         if (!exists(dir.c_str())) continue;
-        wstring errlist;
-        if (!removeDirectoryAndContents(dir, errlist)) {
-            fatalErrorA(
-                "\nRLNCH0107E begin: Error removing metadata plugin directory\n%ls\n"
-                "RLNCH0108E end: Unable to remove all files in the metadata plugin directory. Please correct the "
-                "problems listed above",
-                errlist.c_str(), true);
-            return;
-        }
+        removeTreeOrFail(dir,
+                         "\nRLNCH0107E begin: Error removing metadata plugin directory\n%ls\n"
+                         "RLNCH0108E end: Unable to remove all files in the metadata plugin directory. Please correct "
+                         "the problems listed above");
     }
 }
 
