@@ -8,6 +8,7 @@
 #include <signal.h>
 #include <sys/types.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <string>
 #include <vector>
@@ -28,26 +29,22 @@ const char* const kUserFiles[] = {".config/rcpinstall.properties", ".config/conf
 // rewrite at once and whose bytes therefore mean nothing.
 std::vector<std::string> userTree(const std::string& home) {
     std::vector<std::string> tree = listTree(home);
-    std::vector<std::string> out;
-    for (const auto& p : tree)
-        if (p.find("logs/rcplauncher.log") == std::string::npos) out.push_back(p);
-    return out;
+    tree.erase(std::remove_if(tree.begin(), tree.end(),
+                              [](const std::string& p) { return p.find("logs/rcplauncher.log") != std::string::npos; }),
+               tree.end());
+    return tree;
 }
 
 TEST(Concurrency, ManyLaunchersAtOnceMakeOneMainProcess) {
-    struct Case {
-        const char* name;
-        bool firstLaunch;  // the race starts in an empty home
-    };
-    // The first-launch race on the directories is a matter of timing, so it
-    // runs a few times (RCP_RACE_ROUNDS, default 5) to be seen reliably.
+    // Round 0 races a later launch; every other round the user's first one
+    // (the race starts in an empty home). That race on the directories is a
+    // matter of timing, so it runs a few times (RCP_RACE_ROUNDS, default 5)
+    // to be seen reliably.
     const char* roundsText = getenv("RCP_RACE_ROUNDS");
     const int rounds = roundsText && *roundsText ? atoi(roundsText) : 5;
-    std::vector<Case> cases = {{"later launch", false}};
-    for (int i = 0; i < rounds; i++) cases.push_back({"first launch", true});
-    for (size_t round = 0; round < cases.size(); round++) {
-        const Case& c = cases[round];
-        SCOPED_TRACE(std::string(c.name) + ", round " + std::to_string(round));
+    for (int round = 0; round <= rounds; round++) {
+        const bool firstLaunch = round > 0;
+        SCOPED_TRACE((firstLaunch ? "first launch, round " : "later launch, round ") + std::to_string(round));
         Sandbox sb;
         sb.setupInstall("user", "", "resetDir.a=org.x\n");
         const std::string ws = sb.defaultWorkspace();
@@ -60,7 +57,7 @@ TEST(Concurrency, ManyLaunchersAtOnceMakeOneMainProcess) {
         LaunchResult ref = sb.run(single);
         ASSERT_EQ(ref.status, 0) << ref.describe();
         const std::string refWs = sb.path("refhome") + "/KEL/RCP/ID42/tester";
-        if (!c.firstLaunch) {
+        if (!firstLaunch) {
             LaunchResult earlier = sb.run(single);
             ASSERT_EQ(earlier.status, 0) << earlier.describe();
         }
@@ -76,12 +73,9 @@ TEST(Concurrency, ManyLaunchersAtOnceMakeOneMainProcess) {
         sb.beginRuns();
         std::vector<pid_t> launchers = sb.startTogether(runs);
         std::vector<int> statuses;
-        int started = 0;
-        for (pid_t p : launchers) {
-            statuses.push_back(sb.waitFor(p, 120));
-            if (statuses.back() == 0) started++;
-        }
-        std::vector<ChildRecord> children = sb.collectChildren(started, 30);
+        for (pid_t p : launchers) statuses.push_back(sb.waitFor(p, 120));
+        std::vector<ChildRecord> children =
+            sb.collectChildren(static_cast<int>(std::count(statuses.begin(), statuses.end(), 0)), 30);
         sb.releaseChildren(children, true);
 
         const std::string failure = "\n--- terminal ---\n" + sb.terminalOutput() + "--- /tmp/rcplauncher.log ---\n" +
@@ -94,11 +88,9 @@ TEST(Concurrency, ManyLaunchersAtOnceMakeOneMainProcess) {
         EXPECT_EQ(readText(ws + "/logs/rcplauncher.log").find("RLNCH"), std::string::npos) << failure;
 
         // Exactly one main child; every other one is handed its process id.
-        std::vector<const ChildRecord*> mains;
-        for (const auto& child : children)
-            if (child.argIndex("-useDaemon") == -1) mains.push_back(&child);
-        ASSERT_EQ(mains.size(), 1u) << failure;
-        const ChildRecord& main = *mains.front();
+        auto isMain = [](const ChildRecord& child) { return child.argIndex("-useDaemon") == -1; };
+        ASSERT_EQ(std::count_if(children.begin(), children.end(), isMain), 1) << failure;
+        const ChildRecord& main = *std::find_if(children.begin(), children.end(), isMain);
         const std::string mainPid = std::to_string(main.pid);
         for (const auto& child : children) {
             if (&child == &main) continue;

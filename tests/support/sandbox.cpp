@@ -12,16 +12,15 @@
 #endif
 
 #include <algorithm>
-#include <cctype>
 #include <cerrno>
 #include <chrono>
 #include <climits>
 #include <cstdlib>
 #include <cstring>
+#include <iterator>
+#include <sstream>
 #include <stdexcept>
 #include <thread>
-
-#include "test_util.h"
 
 namespace rcptest {
 
@@ -33,6 +32,17 @@ using Clock = std::chrono::steady_clock;
 
 void nap() { std::this_thread::sleep_for(std::chrono::milliseconds(10)); }
 
+// Polls done() until it holds (true) or timeoutSeconds have passed (false).
+template <class F>
+bool pollUntil(int timeoutSeconds, F done) {
+    const auto deadline = Clock::now() + std::chrono::seconds(timeoutSeconds);
+    while (!done()) {
+        if (Clock::now() > deadline) return false;
+        nap();
+    }
+    return true;
+}
+
 // Reaps every finished child of this process that nobody waits for.
 void reapOrphans() {
     int status;
@@ -40,66 +50,36 @@ void reapOrphans() {
     }
 }
 
-void becomeSubreaper() {
-#ifdef __linux__
-    static bool done = false;
-    if (!done) {
-        prctl(PR_SET_CHILD_SUBREAPER, 1, 0, 0, 0);
-        done = true;
-    }
-#endif
-}
-
 // True once pid is gone: reaped by us, or no longer known to the system.
 bool isGone(long pid) {
     int status;
     pid_t r = waitpid(static_cast<pid_t>(pid), &status, WNOHANG);
     if (r == static_cast<pid_t>(pid)) return true;
-    if (r == -1 && errno == ECHILD) return kill(static_cast<pid_t>(pid), 0) == -1 && errno == ESRCH;
-    return false;
+    return r == -1 && errno == ECHILD && kill(static_cast<pid_t>(pid), 0) == -1 && errno == ESRCH;
 }
 
 void waitGone(long pid, int timeoutSeconds) {
-    if (pid <= 0) return;
-    auto deadline = Clock::now() + std::chrono::seconds(timeoutSeconds);
-    while (!isGone(pid)) {
-        if (Clock::now() > deadline) {
-            kill(static_cast<pid_t>(pid), SIGKILL);
-            deadline = Clock::now() + std::chrono::seconds(5);
-            while (!isGone(pid) && Clock::now() < deadline) nap();
-            return;
-        }
-        nap();
-    }
+    auto gone = [pid] { return isGone(pid); };
+    if (pid <= 0 || pollUntil(timeoutSeconds, gone)) return;
+    kill(static_cast<pid_t>(pid), SIGKILL);
+    pollUntil(5, gone);
 }
 
 // The words of RCP_LAUNCHER_WRAPPER, or none.
 std::vector<std::string> launcherWrapper() {
-    std::vector<std::string> words;
     const char* w = getenv("RCP_LAUNCHER_WRAPPER");
-    std::string text = w ? w : "";
-    size_t i = 0;
-    while (i < text.size()) {
-        while (i < text.size() && isspace(static_cast<unsigned char>(text[i]))) i++;
-        size_t start = i;
-        while (i < text.size() && !isspace(static_cast<unsigned char>(text[i]))) i++;
-        if (i > start) words.push_back(text.substr(start, i - start));
-    }
-    return words;
+    std::istringstream in(w ? w : "");
+    return {std::istream_iterator<std::string>(in), std::istream_iterator<std::string>()};
 }
 
 // A program name without a slash is looked up on the test's own PATH.
 std::string findExecutable(const std::string& name) {
     if (name.find('/') != std::string::npos) return name;
     const char* p = getenv("PATH");
-    std::string path = p ? p : "/usr/bin:/bin";
-    size_t start = 0;
-    while (start <= path.size()) {
-        size_t end = path.find(':', start);
-        if (end == std::string::npos) end = path.size();
-        std::string candidate = (end > start ? path.substr(start, end - start) : ".") + "/" + name;
+    std::istringstream path(std::string(p ? p : "/usr/bin:/bin") + ":");
+    for (std::string dir; std::getline(path, dir, ':');) {
+        std::string candidate = (dir.empty() ? "." : dir) + "/" + name;
         if (access(candidate.c_str(), X_OK) == 0) return candidate;
-        start = end + 1;
     }
     return name;
 }
@@ -110,19 +90,6 @@ void copyExecutable(const std::string& from, const std::string& to) {
     writeText(to, data, 0755);
 }
 
-// Removes /tmp/rcplauncher.log so that a run's fallback log can be told from
-// an older one; a file we may not remove is emptied instead.
-void resetTmpLog() {
-    if (unlink(kTmpLog) != 0 && errno != ENOENT) {
-        int fd = open(kTmpLog, O_WRONLY | O_TRUNC);
-        if (fd >= 0) close(fd);
-    }
-}
-
-std::string recordName(const std::string& base, int i) {
-    return i == 0 ? base : base + "." + std::to_string(i);
-}
-
 void listInto(const std::string& root, const std::string& rel, std::vector<std::string>& out) {
     DIR* d = opendir((root + "/" + rel).c_str());
     if (!d) return;
@@ -130,74 +97,54 @@ void listInto(const std::string& root, const std::string& rel, std::vector<std::
         std::string name = e->d_name;
         if (name == "." || name == "..") continue;
         std::string child = rel.empty() ? name : rel + "/" + name;
-        if (isDir(root + "/" + child)) {
-            out.push_back(child + "/");
-            listInto(root, child, out);
-        } else {
-            out.push_back(child);
-        }
+        bool dir = isDir(root + "/" + child);
+        out.push_back(dir ? child + "/" : child);
+        if (dir) listInto(root, child, out);
     }
     closedir(d);
+}
+
+// Parses the NUL-terminated fields stub_child.c writes; false when malformed.
+bool parseChildRecord(const std::string& data, ChildRecord& out) {
+    if (data.empty() || data.back() != '\0') return false;
+    std::vector<std::string> f;
+    for (size_t s = 0, e; s < data.size(); s = e + 1) {
+        e = data.find('\0', s);
+        f.push_back(data.substr(s, e - s));
+    }
+    size_t i = 0;
+    // tag, then a count no larger than the fields left
+    auto tagged = [&](const char* tag, long& n) {
+        if (i + 2 > f.size() || f[i] != tag) return false;
+        const std::string& v = f[i + 1];
+        i += 2;
+        char* end = nullptr;
+        errno = 0;
+        n = strtol(v.c_str(), &end, 10);
+        return !v.empty() && errno == 0 && *end == '\0' && n >= 0;
+    };
+    long n = 0;
+    if (!tagged("PID", out.pid) || !tagged("ARGV", n) || static_cast<size_t>(n) > f.size() - i) return false;
+    out.argv.assign(f.begin() + static_cast<long>(i), f.begin() + static_cast<long>(i) + n);
+    i += static_cast<size_t>(n);
+    if (!tagged("ENV", n) || static_cast<size_t>(n) > f.size() - i) return false;
+    for (; n > 0; n--, i++) {
+        size_t eq = f[i].find('=');
+        out.env[f[i].substr(0, eq)] = eq == std::string::npos ? "" : f[i].substr(eq + 1);
+    }
+    return i + 1 == f.size() && f[i] == "END";
 }
 
 }  // namespace
 
 int ChildRecord::argIndex(const std::string& arg) const {
-    for (size_t i = 0; i < argv.size(); i++)
-        if (argv[i] == arg) return static_cast<int>(i);
-    return -1;
+    auto it = std::find(argv.begin(), argv.end(), arg);
+    return it == argv.end() ? -1 : static_cast<int>(it - argv.begin());
 }
 
 std::string ChildRecord::argAfter(const std::string& arg) const {
     int i = argIndex(arg);
-    if (i < 0 || static_cast<size_t>(i) + 1 >= argv.size()) return "";
-    return argv[static_cast<size_t>(i) + 1];
-}
-
-bool parseChildRecord(const std::string& data, ChildRecord& out) {
-    std::vector<std::string> fields;
-    size_t start = 0;
-    while (start < data.size()) {
-        size_t end = data.find('\0', start);
-        if (end == std::string::npos) return false;  // a field without its terminator
-        fields.push_back(data.substr(start, end - start));
-        start = end + 1;
-    }
-    size_t i = 0;
-    auto next = [&](std::string& f) {
-        if (i >= fields.size()) return false;
-        f = fields[i++];
-        return true;
-    };
-    auto number = [&](long& n) {
-        std::string f;
-        if (!next(f) || f.empty()) return false;
-        char* end = nullptr;
-        errno = 0;
-        n = strtol(f.c_str(), &end, 10);
-        return errno == 0 && *end == '\0' && n >= 0;
-    };
-    std::string tag;
-    long count = 0;
-    ChildRecord r;
-    if (!next(tag) || tag != "PID" || !number(r.pid)) return false;
-    if (!next(tag) || tag != "ARGV" || !number(count)) return false;
-    for (long k = 0; k < count; k++) {
-        std::string a;
-        if (!next(a)) return false;
-        r.argv.push_back(a);
-    }
-    if (!next(tag) || tag != "ENV" || !number(count)) return false;
-    for (long k = 0; k < count; k++) {
-        std::string e;
-        if (!next(e)) return false;
-        size_t eq = e.find('=');
-        if (eq == std::string::npos) r.env[e] = "";
-        else r.env[e.substr(0, eq)] = e.substr(eq + 1);
-    }
-    if (!next(tag) || tag != "END" || i != fields.size()) return false;
-    out = r;
-    return true;
+    return i < 0 || static_cast<size_t>(i) + 1 >= argv.size() ? "" : argv[static_cast<size_t>(i) + 1];
 }
 
 const ChildRecord& LaunchResult::child() const {
@@ -233,44 +180,33 @@ std::vector<std::string> listTree(const std::string& root) {
 
 std::vector<std::string> splitLines(const std::string& text) {
     std::vector<std::string> out;
-    size_t start = 0;
-    while (start < text.size()) {
-        size_t end = text.find('\n', start);
-        if (end == std::string::npos) end = text.size();
-        out.push_back(text.substr(start, end - start));
-        start = end + 1;
-    }
+    std::istringstream in(text);
+    for (std::string line; std::getline(in, line);) out.push_back(line);
     return out;
 }
 
 std::vector<std::string> logLines(const std::string& log) {
-    std::vector<std::string> out;
-    for (auto& l : splitLines(log))
-        if (!l.empty()) out.push_back(l);
+    std::vector<std::string> out = splitLines(log);
+    out.erase(std::remove(out.begin(), out.end(), std::string()), out.end());
     return out;
 }
 
 bool isErrorLine(const std::string& line, const std::string& message) {
-    std::string prefix = message + " : ";
+    const std::string prefix = message + " : ";
     if (line.compare(0, prefix.size(), prefix) != 0) return false;
-    std::string suffix = line.substr(prefix.size());
     for (int e = 0; e < 256; e++)
-        if (suffix == strerror(e)) return true;
+        if (line.substr(prefix.size()) == strerror(e)) return true;
     return false;
 }
 
 // ---------------------------------------------------------------------------
 
 Sandbox::Sandbox() {
-    becomeSubreaper();
-    const char* t = getenv("TMPDIR");
-    std::string tmpl = std::string(t && *t ? t : "/tmp") + "/rcpe2e.XXXXXX";
-    std::vector<char> buf(tmpl.begin(), tmpl.end());
-    buf.push_back('\0');
-    if (!mkdtemp(buf.data())) throw std::runtime_error("mkdtemp failed");
-    tempDir_ = buf.data();
+#ifdef __linux__
+    prctl(PR_SET_CHILD_SUBREAPER, 1, 0, 0, 0);
+#endif
     char real[PATH_MAX];
-    if (!realpath(tempDir_.c_str(), real)) throw std::runtime_error("realpath failed");
+    if (!realpath(tmp_.path().c_str(), real)) throw std::runtime_error("realpath failed");
     root_ = real;
     makeDirs(home());
     installLauncher(launcher());
@@ -279,20 +215,11 @@ Sandbox::Sandbox() {
 Sandbox::~Sandbox() {
     killChildren();
     reapOrphans();
-    removeTree(tempDir_);
-}
-
-std::string Sandbox::defaultWorkspace(const std::string& installId) const {
-    return home() + "/KEL/RCP/" + installId + "/" + kUser;
 }
 
 void Sandbox::writeFile(const std::string& where, const std::string& text, int mode) const {
     writeText(!where.empty() && where[0] == '/' ? where : path(where), text, mode);
 }
-
-void Sandbox::writeLauncherProperties(const std::string& text) const { writeFile(launcherProperties(), text); }
-
-void Sandbox::writeBase(const std::string& rel, const std::string& text) const { writeFile(base() + "/" + rel, text); }
 
 void Sandbox::installStub(const std::string& where) const { copyExecutable(RCP_STUB_CHILD, where); }
 
@@ -304,12 +231,9 @@ void Sandbox::installLauncher(const std::string& where) const {
 }
 
 std::string Sandbox::standardLauncherProperties(const std::string& configuration) {
-    std::string text =
-        "rcp.install.id=" + std::string(kInstallId) + "\n"
-        "rcp.base.location=${rcp.home}/base\n"
-        "jvm.location=${rcp.home}/jre/bin/java\n";
-    if (!configuration.empty()) text += "install.configuration=" + configuration + "\n";
-    return text;
+    return "rcp.install.id=" + std::string(kInstallId) +
+           "\nrcp.base.location=${rcp.home}/base\njvm.location=${rcp.home}/jre/bin/java\n" +
+           (configuration.empty() ? "" : "install.configuration=" + configuration + "\n");
 }
 
 std::string Sandbox::standardInstallProperties() {
@@ -332,8 +256,7 @@ std::string Sandbox::standardPlatformXml() {
 }
 
 std::string Sandbox::standardConfigIni() {
-    return "osgi.bundles=org.eclipse.core.runtime@start\n"
-           "eclipse.product=com.kel.demo.product\n";
+    return "osgi.bundles=org.eclipse.core.runtime@start\neclipse.product=com.kel.demo.product\n";
 }
 
 void Sandbox::setupInstall(const std::string& configuration, const std::string& extraLauncherProps,
@@ -347,54 +270,44 @@ void Sandbox::setupInstall(const std::string& configuration, const std::string& 
 }
 
 std::map<std::string, std::string> Sandbox::environmentFor(const RunOptions& opts) const {
-    std::map<std::string, std::string> env = {
-        {"HOME", home()},
-        {"USER", kUser},
-        {"PATH", "/usr/bin:/bin"},
-        {"LANG", "C.UTF-8"},
-        {"RCP_STUB_RECORD", path("record")},
-    };
+    std::map<std::string, std::string> env = opts.env;
+    env.insert({{"HOME", home()}, {"USER", kUser}, {"PATH", "/usr/bin:/bin"}, {"LANG", "C.UTF-8"},
+                {"RCP_STUB_RECORD", path("record")}});
     // Sanitizer settings of the test run apply to the launcher as well.
     for (const char* name : {"ASAN_OPTIONS", "UBSAN_OPTIONS", "LSAN_OPTIONS"})
-        if (const char* v = getenv(name)) env[name] = v;
-    for (const auto& kv : opts.env) env[kv.first] = kv.second;
-    for (const auto& name : opts.unset) env.erase(name);
+        if (getenv(name) && !opts.env.count(name)) env[name] = getenv(name);
     return env;
 }
 
-void Sandbox::clearRecords() const {
-    for (int i = 0; i < 1000; i++)
-        if (unlink(recordName(path("record"), i).c_str()) != 0 && i > 0) break;
-}
-
-std::vector<ChildRecord> Sandbox::collectRecords(int expected, int timeoutSeconds) const {
+std::vector<ChildRecord> Sandbox::collectChildren(int expected, int timeoutSeconds) const {
     std::vector<ChildRecord> records;
-    auto deadline = Clock::now() + std::chrono::seconds(timeoutSeconds);
+    const auto deadline = Clock::now() + std::chrono::seconds(timeoutSeconds);
     for (int i = 0;; i++) {
-        std::string name = recordName(path("record"), i);
+        const std::string name = record(i);
         // Records are linked into place complete, so existence is enough.
         while (i < expected && !pathExists(name) && Clock::now() < deadline) nap();
-        if (!pathExists(name)) break;
+        if (!pathExists(name)) return records;
         ChildRecord r;
         if (!parseChildRecord(readText(name), r)) throw std::runtime_error("malformed child record " + name);
         // valgrind removes its own preload library from the environment of
         // the programs its client starts, leaving LD_PRELOAD set but empty;
         // for the loader that is the same as not set.
-        auto preload = r.env.find("LD_PRELOAD");
-        if (!launcherWrapper().empty() && preload != r.env.end() && preload->second.empty()) r.env.erase(preload);
+        if (!launcherWrapper().empty() && r.env.count("LD_PRELOAD") && r.env["LD_PRELOAD"].empty())
+            r.env.erase("LD_PRELOAD");
         records.push_back(r);
     }
-    return records;
 }
 
 void Sandbox::beginRuns() const {
-    clearRecords();
-    resetTmpLog();
+    for (int i = 0; i < 1000; i++)
+        if (unlink(record(i).c_str()) != 0 && i > 0) break;
+    // A fallback log we may not remove is emptied instead, so that a run's
+    // own can still be told from an older one.
+    if (unlink(kTmpLog) != 0 && errno != ENOENT && truncate(kTmpLog, 0) != 0) {
+    }
     unlink(terminalFile().c_str());
     reapOrphans();
 }
-
-pid_t Sandbox::start(const RunOptions& opts) const { return spawn(opts, -1); }
 
 std::vector<pid_t> Sandbox::startTogether(const std::vector<RunOptions>& runs) const {
     int gate[2];
@@ -410,25 +323,20 @@ std::vector<pid_t> Sandbox::startTogether(const std::vector<RunOptions>& runs) c
 }
 
 pid_t Sandbox::spawn(const RunOptions& opts, int gateRead, int gateWrite) const {
-    const std::string program = opts.program.empty() ? launcher() : opts.program;
-    if (opts.uid >= 0 || opts.gid >= 0) {
-        // The launcher of another user must reach its program and the stub
-        // children their record files.
-        if (chmod(root_.c_str(), 01777) != 0) throw std::runtime_error("cannot open the sandbox to other users");
-    }
-
-    std::vector<std::string> argStore = launcherWrapper();
-    argStore.push_back(program);
+    // The launcher of another user must reach its program and the stub
+    // children their record files.
+    if ((opts.uid >= 0 || opts.gid >= 0) && chmod(root_.c_str(), 01777) != 0)
+        throw std::runtime_error("cannot open the sandbox to other users");
+    std::vector<std::string> argStore = launcherWrapper(), envStore;
+    argStore.push_back(opts.program.empty() ? launcher() : opts.program);
     argStore.insert(argStore.end(), opts.args.begin(), opts.args.end());
-    const std::string executable = findExecutable(argStore.front());
-    std::vector<std::string> envStore;
+    const std::string executable = findExecutable(argStore.front()), terminal = terminalFile();
     for (const auto& kv : environmentFor(opts)) envStore.push_back(kv.first + "=" + kv.second);
     std::vector<char*> argv, envp;
     for (auto& a : argStore) argv.push_back(&a[0]);
-    argv.push_back(nullptr);
     for (auto& e : envStore) envp.push_back(&e[0]);
+    argv.push_back(nullptr);
     envp.push_back(nullptr);
-    const std::string terminal = terminalFile();
 
     pid_t pid = fork();
     if (pid < 0) throw std::runtime_error("fork failed");
@@ -454,21 +362,18 @@ pid_t Sandbox::spawn(const RunOptions& opts, int gateRead, int gateWrite) const 
 }
 
 int Sandbox::waitFor(pid_t pid, int timeoutSeconds) const {
-    auto deadline = Clock::now() + std::chrono::seconds(timeoutSeconds);
     int status = 0;
-    for (;;) {
-        pid_t r = waitpid(pid, &status, WNOHANG);
-        if (r == pid) break;
-        if (r < 0 && errno != EINTR) return -1;
-        if (Clock::now() > deadline) {
-            kill(pid, SIGKILL);
-            waitpid(pid, &status, 0);
-            return -1;
-        }
-        nap();
+    pid_t r = 0;
+    if (!pollUntil(timeoutSeconds, [&] {
+            r = waitpid(pid, &status, WNOHANG);
+            return r == pid || (r < 0 && errno != EINTR);
+        })) {
+        kill(pid, SIGKILL);
+        waitpid(pid, &status, 0);
+        return -1;
     }
-    if (WIFEXITED(status)) return WEXITSTATUS(status);
-    if (WIFSIGNALED(status)) return 128 + WTERMSIG(status);
+    if (r == pid && WIFEXITED(status)) return WEXITSTATUS(status);
+    if (r == pid && WIFSIGNALED(status)) return 128 + WTERMSIG(status);
     return -1;
 }
 
@@ -480,21 +385,14 @@ void Sandbox::releaseChildren(const std::vector<ChildRecord>& children, bool kee
     reapOrphans();
 }
 
-std::string Sandbox::terminalOutput() const { return readText(terminalFile()); }
-
 LaunchResult Sandbox::run(const RunOptions& opts) {
     LaunchResult res;
     res.launcherEnv = environmentFor(opts);
-
     beginRuns();
-    pid_t pid = start(opts);
-    res.status = waitFor(pid, opts.timeoutSeconds);
+    res.status = waitFor(start(opts), opts.timeoutSeconds);
     res.timedOut = res.status == -1;
-
-    int expected = opts.expectChildren >= 0 ? opts.expectChildren : (res.status == 0 ? 1 : 0);
-    res.children = collectRecords(expected, 15);
+    res.children = collectChildren(opts.expectChildren >= 0 ? opts.expectChildren : res.status == 0, 15);
     releaseChildren(res.children, opts.keepChildren);
-
     res.tmpLogWritten = pathExists(kTmpLog);
     res.tmpLog = readText(kTmpLog);
     res.terminal = terminalOutput();

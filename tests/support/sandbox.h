@@ -33,7 +33,10 @@
 #include <ctime>
 #include <map>
 #include <string>
+#include <tuple>
 #include <vector>
+
+#include "test_util.h"
 
 namespace rcptest {
 
@@ -53,13 +56,9 @@ struct ChildRecord {
     bool hasEnv(const std::string& name) const { return env.count(name) != 0; }
 };
 
-// Parses the NUL-separated record format of stub_child.c; false when malformed.
-bool parseChildRecord(const std::string& data, ChildRecord& out);
-
 struct RunOptions {
     std::vector<std::string> args;               // the launcher's arguments after argv[0]
     std::map<std::string, std::string> env;      // added to / replacing the sandbox environment
-    std::vector<std::string> unset;              // variables left out (e.g. "USER")
     std::string program;                         // what to execute; default: the installed launcher
     int expectChildren = -1;                     // -1: one when the launcher exits 0, else none
     bool keepChildren = false;                   // leave the children running (RCP_STUB_SLEEP)
@@ -95,8 +94,8 @@ struct FileState {
     std::string bytes;
     struct timespec mtime = {0, 0};
     bool operator==(const FileState& o) const {
-        return present == o.present && bytes == o.bytes && mtime.tv_sec == o.mtime.tv_sec &&
-               mtime.tv_nsec == o.mtime.tv_nsec;
+        return std::tie(present, bytes, mtime.tv_sec, mtime.tv_nsec) ==
+               std::tie(o.present, o.bytes, o.mtime.tv_sec, o.mtime.tv_nsec);
     }
 };
 FileState fileState(const std::string& path);
@@ -125,7 +124,6 @@ public:
     const std::string& root() const { return root_; }
     std::string path(const std::string& rel) const { return root_ + "/" + rel; }
     std::string inst() const { return path("inst"); }
-    std::string rcpDir() const { return path("inst/rcp"); }
     std::string launcher() const { return path("inst/rcp/rcplauncher"); }
     std::string launcherProperties() const { return path("inst/rcp/rcplauncher.properties"); }
     std::string base() const { return path("inst/base"); }
@@ -133,15 +131,17 @@ public:
     std::string jvm() const { return path("inst/jre/bin/java"); }
     std::string home() const { return path("home"); }
     // HOME/KEL/RCP/<id>/tester and its configuration area.
-    std::string defaultWorkspace(const std::string& installId = kInstallId) const;
+    std::string defaultWorkspace(const std::string& installId = kInstallId) const {
+        return home() + "/KEL/RCP/" + installId + "/" + kUser;
+    }
     std::string defaultConfig(const std::string& installId = kInstallId) const {
         return defaultWorkspace(installId) + "/.config";
     }
 
     // Writes a file (absolute path, or relative to the sandbox root).
     void writeFile(const std::string& where, const std::string& text, int mode = 0644) const;
-    void writeLauncherProperties(const std::string& text) const;
-    void writeBase(const std::string& rel, const std::string& text) const;
+    void writeLauncherProperties(const std::string& text) const { writeFile(launcherProperties(), text); }
+    void writeBase(const std::string& rel, const std::string& text) const { writeFile(base() + "/" + rel, text); }
     // Copies the stub child to an absolute path, mode 0755.
     void installStub(const std::string& where) const;
     // Copies the built launcher to an absolute path, mode 0755.
@@ -180,7 +180,7 @@ public:
     void beginRuns() const;
     // Starts the launcher as run() would, without waiting; its terminal
     // output is appended to the batch's.
-    pid_t start(const RunOptions& opts) const;
+    pid_t start(const RunOptions& opts) const { return spawn(opts, -1); }
     // Starts one launcher per element that all begin at the same moment:
     // each waits at a gate until the last one is forked.
     std::vector<pid_t> startTogether(const std::vector<RunOptions>& runs) const;
@@ -189,24 +189,21 @@ public:
     int waitFor(pid_t launcher, int timeoutSeconds = 60) const;
     // Waits until at least `expected` records are there (at most
     // timeoutSeconds), then returns all of them in the order they started.
-    std::vector<ChildRecord> collectChildren(int expected, int timeoutSeconds = 15) const {
-        return collectRecords(expected, timeoutSeconds);
-    }
+    std::vector<ChildRecord> collectChildren(int expected, int timeoutSeconds = 15) const;
     // Waits for the recorded children to end, or, with keep, leaves them to
     // killChildren() (and the destructor).
     void releaseChildren(const std::vector<ChildRecord>& children, bool keep);
     // Everything the launchers of the batch wrote to the terminal.
-    std::string terminalOutput() const;
+    std::string terminalOutput() const { return readText(terminalFile()); }
 
 private:
     std::map<std::string, std::string> environmentFor(const RunOptions& opts) const;
     std::string terminalFile() const { return root_ + "/terminal.out"; }
+    std::string record(int i) const { return path("record") + (i ? "." + std::to_string(i) : ""); }
     pid_t spawn(const RunOptions& opts, int gateRead, int gateWrite = -1) const;
-    void clearRecords() const;
-    std::vector<ChildRecord> collectRecords(int expected, int timeoutSeconds) const;
 
+    TempDir tmp_;
     std::string root_;
-    std::string tempDir_;
     std::vector<long> kept_;
 };
 

@@ -27,61 +27,35 @@
 
 #define MAX_RECORDS 1000
 
-static int write_all(int fd, const char* data, size_t len) {
-    while (len > 0) {
-        ssize_t n = write(fd, data, len);
-        if (n < 0) {
-            if (errno == EINTR) continue;
-            return -1;
-        }
-        data += n;
-        len -= (size_t)n;
-    }
-    return 0;
-}
-
-static int write_field(int fd, const char* text) { return write_all(fd, text, strlen(text) + 1); }
-
-static int write_number(int fd, long value) {
-    char buf[32];
-    snprintf(buf, sizeof buf, "%ld", value);
-    return write_field(fd, buf);
-}
+/* Each field ends in a NUL byte; nonzero on failure. */
+static int write_field(int fd, const char* text) { return dprintf(fd, "%s%c", text, '\0') < 0; }
 
 static int write_list(int fd, const char* tag, char** list) {
     long count = 0;
     while (list && list[count]) count++;
-    if (write_field(fd, tag) || write_number(fd, count)) return -1;
+    if (write_field(fd, tag) || dprintf(fd, "%ld%c", count, '\0') < 0) return -1;
     for (long i = 0; i < count; i++)
         if (write_field(fd, list[i])) return -1;
     return 0;
 }
 
 static int write_record(const char* path, char** argv, char** envp) {
-    size_t len = strlen(path);
-    char* tmp = malloc(len + 64);
-    char* name = malloc(len + 16);
+    size_t len = strlen(path) + 64;
+    char* tmp = malloc(len);
+    char* name = malloc(len);
     int rc = -1;
     if (!tmp || !name) goto out;
 
-    snprintf(tmp, len + 64, "%s.tmp.%ld", path, (long)getpid());
+    snprintf(tmp, len, "%s.tmp.%ld", path, (long)getpid());
     int fd = open(tmp, O_WRONLY | O_CREAT | O_TRUNC, 0644);
     if (fd < 0) goto out;
-    int bad = write_field(fd, "PID") || write_number(fd, (long)getpid()) || write_list(fd, "ARGV", argv) ||
-              write_list(fd, "ENV", envp) || write_field(fd, "END");
+    int bad = write_field(fd, "PID") || dprintf(fd, "%ld%c", (long)getpid(), '\0') < 0 ||
+              write_list(fd, "ARGV", argv) || write_list(fd, "ENV", envp) || write_field(fd, "END");
     if (close(fd) != 0) bad = 1;
-    if (!bad) {
-        for (int i = 0; i < MAX_RECORDS; i++) {
-            if (i == 0)
-                snprintf(name, len + 16, "%s", path);
-            else
-                snprintf(name, len + 16, "%s.%d", path, i);
-            if (link(tmp, name) == 0) {
-                rc = 0;
-                break;
-            }
-            if (errno != EEXIST) break;
-        }
+    for (int i = 0; !bad && i < MAX_RECORDS; i++) {
+        snprintf(name, len, i ? "%s.%d" : "%s", path, i);
+        if (link(tmp, name) == 0) rc = 0;
+        if (rc == 0 || errno != EEXIST) break;
     }
     unlink(tmp);
 out:
