@@ -45,15 +45,12 @@ bool pollUntil(int timeoutSeconds, F done) {
 
 // Reaps every finished child of this process that nobody waits for.
 void reapOrphans() {
-    int status;
-    while (waitpid(-1, &status, WNOHANG) > 0) {
-    }
+    while (waitpid(-1, nullptr, WNOHANG) > 0) continue;
 }
 
 // True once pid is gone: reaped by us, or no longer known to the system.
 bool isGone(long pid) {
-    int status;
-    pid_t r = waitpid(static_cast<pid_t>(pid), &status, WNOHANG);
+    pid_t r = waitpid(static_cast<pid_t>(pid), nullptr, WNOHANG);
     if (r == static_cast<pid_t>(pid)) return true;
     return r == -1 && errno == ECHILD && kill(static_cast<pid_t>(pid), 0) == -1 && errno == ESRCH;
 }
