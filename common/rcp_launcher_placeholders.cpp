@@ -15,10 +15,18 @@ namespace {
 // value that contains itself.
 const int MAX_PLACEHOLDER_CYCLES = 10;
 
-// Values that expand each other can double the text at every step; past
-// these bounds the expansion is treated like a self-referencing value.
+// Values that expand each other can double the text at every step, and many
+// values can each take a copy of one large value. Both are bounded: one value
+// by its length and its number of steps, the installation properties of a
+// launch together by the text their expanded values hold (4 Mi characters,
+// 16 MiB as wide text: far above any real installation). Past a bound the
+// expansion is treated like a self-referencing value.
 const size_t MAX_EXPANDED_LENGTH = 1u << 17;
 const size_t MAX_EXPANSION_STEPS = 4096;
+const size_t MAX_EXPANDED_TOTAL = 4u << 20;
+
+// How much of a failed value the RLNCH0088E line quotes.
+const size_t QUOTED_VALUE_LIMIT = 256;
 
 // The debug line is cut at 4096 bytes anyway; no need to copy more of a long
 // text into it.
@@ -65,6 +73,13 @@ bool startsWith(const wstring& s, const wchar_t* prefix) { return s.compare(0, w
 void appendForLog(wstring& log, const wstring& text) {
     if (log.length() >= LOG_TEXT_LIMIT) return;
     log.append(text, 0, LOG_TEXT_LIMIT - log.length());
+}
+
+// Ends the launch for a value that cannot be expanded. A value that ran away
+// can be megabytes long; the line names its beginning.
+void substitutionInvalid(wstring text) {
+    if (text.length() > QUOTED_VALUE_LIMIT) text = text.substr(0, QUOTED_VALUE_LIMIT) + L"...";
+    fatalErrorA("RLNCH0088E: property substitution is invalid (%ls)", text.c_str(), true);
 }
 
 }  // namespace
@@ -183,9 +198,7 @@ bool replaceAllPlaceholders(const wstring& workspaceLocation, const wstring& ins
                             wstring& placeholderString, std::vector<String>& rcpInstallPropertiesArray) {
     bool modified = replaceStdPlaceholders(workspaceLocation, installDir, placeholderString);
     wstring temp = placeholderString;
-    if (!replaceUserPlaceholders(temp, rcpInstallPropertiesArray)) {
-        fatalErrorA("RLNCH0088E: property substitution is invalid (%ls)", temp.c_str(), true);
-    }
+    if (!replaceUserPlaceholders(temp, rcpInstallPropertiesArray)) substitutionInvalid(temp);
     if (temp != placeholderString) {
         placeholderString = temp;
         modified = true;
@@ -199,10 +212,13 @@ void replacePlaceholdersInRcpInstallProp(wstring workspaceLocation, wstring inst
     convertBS2S(installDir);
     // Values in array order: a "${prop.KEY}" sees KEY's value expanded when
     // KEY came earlier in the file.
+    size_t expandedTotal = 0;
     for (size_t i = 1; i < rcpInstallPropertiesArray.size(); i += 2) {
         if (rcpInstallPropertiesArray[i] == nullptr) continue;
         wstring value = rcpInstallPropertiesArray[i];
         if (replaceAllPlaceholders(workspaceLocation, installDir, value, rcpInstallPropertiesArray)) {
+            expandedTotal += value.length();
+            if (expandedTotal > MAX_EXPANDED_TOTAL) substitutionInvalid(value);
             String expanded = initMemString(newString(value.length() + 1), value.c_str());
             freeString(rcpInstallPropertiesArray[i]);
             rcpInstallPropertiesArray[i] = expanded;

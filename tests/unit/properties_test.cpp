@@ -172,7 +172,8 @@ TEST_F(PropertiesTest, PlaceholdersInTheInstallationPropertiesAndTheArguments) {
         EXPECT_TRUE(i % 2 ? cargv[i] == args.argv()[i] : cargv[i][0] == 0) << i;
     }
 
-    PropArray b{{L"b", L"z"}}, late{{L"a", L"${prop.b}"}, {L"b", L"${rcp.home}"}};
+    PropArray b{{L"b", L"z"}}, late{{L"a", L"${prop.b}"}, {L"b", L"${rcp.home}"}}, copies{{L"a0", std::wstring(100000, L'a')}};
+    for (int i = 1; i <= 4000; ++i) addProps(copies, {{L"a" + std::to_wstring(i), L"${prop.a0}"}});
     std::wstring s = L"${prop.b}-${env.RCPT_UNSET}";
     std::vector<String> none;
     expectFatal({
@@ -181,6 +182,9 @@ TEST_F(PropertiesTest, PlaceholdersInTheInstallationPropertiesAndTheArguments) {
          "RLNCH0088E: property substitution is invalid (z-${env.RCPT_UNSET}) : "},
         // a standard placeholder that arrives through a later key is a user key
         {[&] { replacePlaceholdersInRcpInstallProp(L"/ws", L"/opt", late.v()); }, "invalid (${rcp.home})"},
+        // many copies of one large value: the whole launch's expansion is bounded, the line cut
+        {[&] { replacePlaceholdersInRcpInstallProp(L"/ws", L"/opt", copies.v()); },
+         "RLNCH0088E: property substitution is invalid (" + std::string(256, 'a') + "...) : "},
     });
 }
 
