@@ -75,7 +75,11 @@ void wcstochar(std::string& str, const wchar_t* wcs);
 void convertBS2S(std::wstring& in);
 void convertToOsSeparator(std::wstring& in);
 void convertS2BS(std::wstring& in);
-// fopen with wide name and mode; the stream is byte-oriented. Null on failure.
+// Opens an existing file for reading ("r") or update ("r+"); the stream is
+// byte-oriented. Only a regular file is opened (a link to one is fine), and
+// the open never blocks: a FIFO or a device planted where a properties file
+// belongs gets null, like a missing file, instead of stalling the launch or
+// feeding it without end. Null on failure, errno set.
 void open_file(FILE*& inX, const wchar_t* file, const wchar_t* mode);
 // Null (and RLNCH0081I) when unset; the value's text (possibly "") when set.
 const wchar_t* getEnv(const wchar_t* var, std::wstring& value);
@@ -94,13 +98,21 @@ void addEnvJavaHighZipfds(std::vector<String>& rcpInstallPropertiesArray);
 void setPreload(const wchar_t* ldPreload, const wchar_t* IDString);
 
 // ===================== File system (rcp_launcher_macos_fs) ===================
+// open(2) for the layer's own use: close-on-exec, never blocking, and only a
+// regular file is kept (else -1 with errno EISDIR for a directory, EINVAL for
+// any other kind of file). flags add the access mode, O_CREAT, O_NOFOLLOW...
+int openRegularFile(const char* path, int flags, int mode = 0);
 int createDirectory(const wchar_t* dir);  // one mkdir, mode 0775
 int removeDirectoryContents(const std::string& dir, std::string& indent, std::string& errlist);
 int removeDirectoryContents(const std::wstring& dir, std::wstring& errlist);
 int removeDirectoryAndContents(const std::wstring& dir, std::wstring& errlist);
-int copyFile(const wchar_t* origFile, const wchar_t* newFile);  // failures are fatal
+// A byte-for-byte copy (whatever the text's encoding) that appears under
+// newFile only complete: written as a work file and renamed into place.
+// Every failure is fatal (RLNCH0190E-RLNCH0193E), with the work file removed.
+int copyFile(const wchar_t* origFile, const wchar_t* newFile);
 int moveFile(const wchar_t* origFile, const wchar_t* newFile);
 int deleteFile(const wchar_t* file);
+// The path can be opened for reading (never blocking on a FIFO).
 int exists(const wchar_t* file);
 int existsA(const char* file);
 int isDirectory(const wchar_t* file);
@@ -109,6 +121,22 @@ int isExecutable(const wchar_t* file);
 // scratch area; the item is converted into inputLineX. Returns fscanf's result.
 int readFile(FILE* inX, const wchar_t* mode, std::wstring& inputLineX);
 void open_wfile(FILE*& inX, const wchar_t* file, const wchar_t* mode);
+
+// Files written for the user appear only complete. A work file is created
+// afresh (a work file left by a killed launch is removed first, and the
+// exclusive create never follows a link planted at the name); it is
+// byte-oriented and written with putWide. finishWorkFile closes it and
+// answers whether every write, the flush and the close succeeded, removing
+// the work file when not; commitWorkFile then renames it into place (the
+// work file is removed when that fails too). Both return 1 for success.
+FILE* createWorkFile(const std::wstring& workPath);
+int finishWorkFile(FILE* fp, const std::wstring& workPath);
+int commitWorkFile(FILE* fp, const std::wstring& workPath, const std::wstring& finalPath);
+// Writes text in the locale's encoding, bytes that came in undecodable
+// going out unchanged. False once the stream has had a write error.
+bool putWide(FILE* fp, const std::wstring& text);
+// The whole content of a regular file, when it is at most limit bytes.
+bool readSmallFile(const std::wstring& path, std::string& bytes, size_t limit);
 const wchar_t* getUserHome(std::wstring& envHome);
 void sysSleep(int seconds);
 

@@ -3,9 +3,7 @@
 // values the other modules need: the log directory of a workspace, the path
 // of a per-configuration template file and the time stamp used for new
 // installation identifiers.
-#include <sys/stat.h>
 #include <sys/time.h>
-#include <unistd.h>
 
 #include <cwchar>
 #include <string>
@@ -31,18 +29,15 @@ const wchar_t* coreSubFolder() {
     }
 }
 
-// One escaped "key=value" line of the record; a failed write ends the launch
-// (false is returned only should the fatal path ever come back).
-bool writeRecordLine(FILE* fp, const wstring& key, const wstring& value, const wstring& tfile) {
-    wstring line;
-    convWcharTo8859_1(key, value, line);
-    if (fwprintf(fp, L"%ls\n", line.c_str()) < 0) {
-        fclose(fp);
-        fatalErrorA("RLNCH0020E: Error writing to %ls file.", tfile.c_str(), true);
-        return false;
-    }
-    return true;
+// One escaped "key=value" line of the record.
+void appendRecordLine(wstring& record, const wstring& key, const wstring& value) {
+    convWcharTo8859_1(key, value, record);
+    record += NEWLINE;
 }
+
+// Longest record worth comparing with before it is rewritten; a longer one
+// is simply written again.
+constexpr size_t RECORD_COMPARE_LIMIT = 64 * 1024;
 
 }  // namespace
 
@@ -50,28 +45,15 @@ void writeStartupArgs(int argc, wchar_t** argv, const wstring& configLocation) {
     wstring tfile = configLocation + L"/" + ARGS_PROPERTIES;
     convertToOsSeparator(tfile);
 
-    // An existing record is written over and cut to the new length at the
-    // end rather than emptied first: emptying a file that is then rewritten
-    // makes some file systems (ext4) free its blocks and force the new ones to
-    // disk on close, which is most of what writing the record would cost.
-    FILE* fp = nullptr;
-    open_wfile(fp, tfile.c_str(), L"r+");
-    if (fp == nullptr) open_wfile(fp, tfile.c_str(), L"w+");
-    if (fp == nullptr) {
-        fatalErrorA("RLNCH0019E: Could not open %ls for writing!", tfile.c_str(), true);
-        return;
-    }
-
     // The platform adds these itself when it restarts the launcher; recording
     // them would make every later start a restart or a reset.
     const int restartIndex = findOption(RESTARTARG, argc, argv);
     const int resetIndex = findOption(RESETCONFIGARG, argc, argv);
 
+    wstring record;
     int writeNum = 0;
     for (int i = 0; i < argc; i++) {
         if (i == restartIndex || i == resetIndex) continue;
-        wstring key = ARG_KEY_PREFIX + std::to_wstring(writeNum);
-        writeNum++;
         wstring value;
         if (i == 0) {
             // The path as typed may be relative or found through PATH; the
@@ -80,20 +62,24 @@ void writeStartupArgs(int argc, wchar_t** argv, const wstring& configLocation) {
         } else if (argv[i] != nullptr) {
             value = argv[i];
         }
-        if (!writeRecordLine(fp, key, value, tfile)) return;
+        appendRecordLine(record, ARG_KEY_PREFIX + std::to_wstring(writeNum++), value);
     }
-    if (!writeRecordLine(fp, ARGC_KEY, std::to_wstring(writeNum), tfile)) return;
+    appendRecordLine(record, ARGC_KEY, std::to_wstring(writeNum));
 
-    // A full disk shows up only when the buffer is flushed.
-    bool written = fflush(fp) == 0;
-    if (written) {
-        // Only a regular file longer than the new record has anything to cut.
-        const off_t length = lseek(fileno(fp), 0, SEEK_CUR);
-        struct stat st;
-        if (length >= 0 && fstat(fileno(fp), &st) == 0 && S_ISREG(st.st_mode) && st.st_size > length)
-            written = ftruncate(fileno(fp), length) == 0;
-    }
-    if (fclose(fp) != 0 || !written) fatalErrorA("RLNCH0020E: Error writing to %ls file.", tfile.c_str(), true);
+    // Most launches are started the same way as the one before: a record that
+    // already says this is left alone, which costs a read instead of a write.
+    std::string recordBytes;
+    wstrtocs(recordBytes, record);
+    std::string existing;
+    if (readSmallFile(tfile, existing, RECORD_COMPARE_LIMIT) && existing == recordBytes) return;
+
+    // Otherwise the new record replaces the old one only once it is complete:
+    // a failed write (a full disk) leaves the previous record as it was.
+    const wstring work = tfile + WORK_FILE_SUFFIX;
+    FILE* fp = createWorkFile(work);
+    if (fp == nullptr) fatalErrorA("RLNCH0019E: Could not open %ls for writing!", tfile.c_str(), true);
+    putWide(fp, record);
+    if (!commitWorkFile(fp, work, tfile)) fatalErrorA("RLNCH0020E: Error writing to %ls file.", tfile.c_str(), true);
 }
 
 void getLogLocation(wstring& logLocation, const wstring& workspaceLocation) {

@@ -15,12 +15,13 @@ namespace {
 constexpr const wchar_t* REQUIRED_LAUNCHER_VALUES[] = {RCP_INSTALL_ID_PROPERTY, JVM_LOCATION, RCP_BASE_LOC_PROPERTY,
                                                         CONFIGURATION_PROPERTY};
 
-// Reads the next line of a template. False at the end of the file, and also
-// when the scan matched nothing: that happens only at a line end the scan
-// cannot pass (a file that begins with an empty line), where going on would
-// never make progress.
-bool readTemplateLine(FILE* in, wstring& line, int& scanResult) {
-    scanResult = readFile(in, LINE_SCAN_FORMAT, line);
+// Reads the next line of a template; false at the end of the file. The
+// line format swallows the white space after each line, so the scan can meet
+// a line end only at the very start of a file: such leading empty lines are
+// skipped like every other blank line (with the indentation after them).
+bool readTemplateLine(FILE* in, wstring& line) {
+    int scanResult = readFile(in, LINE_SCAN_FORMAT, line);
+    if (scanResult == 0) scanResult = readFile(in, PROP_LINE_FORMAT, line);
     return scanResult > 0;
 }
 
@@ -51,7 +52,7 @@ bool appendPath(wstring& block, const wchar_t* key, const wchar_t* sourceKey, co
 }
 
 void writeCopiedLine(FILE* out, const wstring& line) {
-    if (fputws((line + NEWLINE).c_str(), out) < 0) {
+    if (!putWide(out, line + NEWLINE)) {
         SvcDebugOutA(
             "RLNCH0001E: Error while copying base rcpinstall.properties to user specific rcpinstall.properties file.");
     }
@@ -91,9 +92,13 @@ wstring createRCPInstallProps(const wstring& workspaceLocation, const wstring& c
     deleteFile(copyPath.c_str());
 
     // One rename puts the finished file in place. When the work file could
-    // not be written or renamed, no per-user file is left: the read that
-    // follows then fails and the next launch builds the file again.
-    if (fixed != 0 || !moveFile(newPropPath.c_str(), propPath.c_str())) deleteFile(propPath.c_str());
+    // not be written in full (a full disk) or renamed, no per-user file is
+    // left: the read that follows fails (RLNCH0014E) and the next launch
+    // builds the file again.
+    if (fixed != 0 || !moveFile(newPropPath.c_str(), propPath.c_str())) {
+        deleteFile(newPropPath.c_str());
+        deleteFile(propPath.c_str());
+    }
 
     userFirstLaunch = true;
     return propPath;
@@ -109,24 +114,22 @@ int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propP
     convertToOsSeparator(outPath);
 
     FILE* in = nullptr;
-    FILE* out = nullptr;
     open_file(in, inPath.c_str(), L"r");
-    open_wfile(out, outPath.c_str(), L"w");
+    FILE* out = createWorkFile(outPath);
     if (in == nullptr || out == nullptr) {
         SvcDebugOutA(
             "RLNCH0074E: Unable to open user specific rcpinstall.properties and temporary rcpinstall.properties "
             "files.");
         if (in != nullptr) fclose(in);
-        if (out != nullptr) fclose(out);
+        if (out != nullptr) finishWorkFile(out, outPath);
         return -1;
     }
 
     rewind(in);
     bool bPropertyContinuation = false;         // a kept property continues on the next line
     bool bInvalidPropertyContinuation = false;  // a dropped property continues on the next line
-    int scan_result = 0;
     wstring line;
-    while (!feof(in) && readTemplateLine(in, line, scan_result)) {
+    while (!feof(in) && readTemplateLine(in, line)) {
         if (bInvalidPropertyContinuation) {
             bInvalidPropertyContinuation = isContinuationLine(line);
             bPropertyContinuation = false;
@@ -176,10 +179,13 @@ int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propP
     }
 
     // The block is expanded as a text without arguments ("%%" gives "%"),
-    // never handed to printf as a format.
-    const bool appended = fputws(formatWithoutArgs(block).c_str(), out) >= 0 && fflush(out) == 0;
-    if (!appended) SvcDebugOutA("RLNCH0015E: Unable to append values to user specific rcpinstall.properties file.");
-    fclose(out);
+    // never handed to printf as a format. Only a work file whose every line
+    // reached the disk counts as written.
+    putWide(out, formatWithoutArgs(block));
+    if (!finishWorkFile(out, outPath)) {
+        SvcDebugOutA("RLNCH0015E: Unable to append values to user specific rcpinstall.properties file.");
+        return -1;
+    }
     return 0;
 }
 
@@ -188,19 +194,11 @@ void createConfigIni(const wstring& configLocation, const wstring& baseLocation)
     convertToOsSeparator(target);
     if (exists(target.c_str())) return;
 
-    // Copied under a work name and renamed into place: a launch killed
-    // during the copy must not leave a cut file that later launches keep.
+    // copyFile puts the file in place only once it is complete, so a launch
+    // killed during the copy leaves no cut file for later launches to keep.
     const wstring basePath = getCoreFileLocation(baseLocation, CONFIG_INI);
-    const wstring work = target + WORK_FILE_SUFFIX;
-    if (!copyFile(basePath.c_str(), work.c_str())) {
+    if (!copyFile(basePath.c_str(), target.c_str()))
         fatalErrorA("RLNCH0009E: Unable to copy config.ini to the user directory.", true);
-        return;
-    }
-    if (!moveFile(work.c_str(), target.c_str())) {
-        deleteFile(work.c_str());
-        fatalErrorA("RLNCH0009E: Unable to copy config.ini to the user directory.", true);
-        return;
-    }
     userFirstLaunch = true;
 }
 
@@ -235,10 +233,10 @@ int createPlatformXML(const wstring& configLocation, const wstring& baseLocation
         return -1;
     }
     // Written under a work name and renamed into place once complete, so that
-    // a launch killed half-way leaves no cut file for later launches to keep.
+    // neither a launch killed half-way nor a full disk leaves a cut file for
+    // later launches to keep: without a file, the next launch writes it again.
     const wstring work = target + WORK_FILE_SUFFIX;
-    FILE* out = nullptr;
-    open_wfile(out, work.c_str(), L"w");
+    FILE* out = createWorkFile(work);
     if (out == nullptr) {
         SvcDebugOutW(L"RLNCH0105E: Unable to open platform.xml for writing.\"%s\"", target.c_str());
         fclose(in);
@@ -246,20 +244,21 @@ int createPlatformXML(const wstring& configLocation, const wstring& baseLocation
     }
 
     rewind(in);
-    int scan_result = 0;
     wstring line;
-    while (!feof(in) && readTemplateLine(in, line, scan_result)) {
+    bool written = true;
+    while (written && !feof(in) && readTemplateLine(in, line)) {
         // The JVM's feature is filled in by the platform at run time.
         if (line.find(JVM_FEATUREID_REPLACE) != wstring::npos) line = FEATURE_LINE;
         if (line.find(JVM_PARENT_FEATUREID_REPLACE) != wstring::npos) line = FEATURE_LINE;
-        line += NEWLINE;
-        if (fputws(line.c_str(), out) < 0) {
-            SvcDebugOutA("RLNCH0103E: Error while copying platform.xml to user specific platform.xml file.");
-            break;
-        }
+        written = putWide(out, line + NEWLINE);
     }
     fclose(in);
-    fclose(out);
+    // A failed write leaves the stream's error flag set, so this also covers
+    // what only the flush and the close report (a full disk).
+    if (!finishWorkFile(out, work)) {
+        SvcDebugOutA("RLNCH0103E: Error while copying platform.xml to user specific platform.xml file.");
+        return -1;
+    }
     if (!moveFile(work.c_str(), target.c_str())) {
         SvcDebugOutW(L"RLNCH0105E: Unable to open platform.xml for writing.\"%s\"", target.c_str());
         deleteFile(work.c_str());

@@ -148,14 +148,24 @@ std::string narrowFormatForWideArg(const char* msg) {
 }
 
 // Opens the log without following a symbolic link at its name, so that a link
-// planted at a fixed path (the /tmp fallback) is never written through.
+// planted at a fixed path (the /tmp fallback) is never written through, and
+// without blocking, so that a FIFO planted there cannot hold the launch; only
+// a regular file is kept. In the world-writable /tmp the file must also be
+// the launching user's own: a file another user made there (and may read)
+// gets none of this launch's lines.
 // The old content is not truncated here but cut after the first write (see
 // enableLogging): emptying a file that is then rewritten makes some file
 // systems (ext4) free its blocks and force them to disk again on close,
 // which costs more than the rest of a launch's file work.
-FILE* openLogStream(const std::string& path) {
-    int fd = open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0666);
+FILE* openLogStream(const std::string& path, bool mustBeOwn) {
+    int fd = openRegularFile(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW, 0666);
     if (fd < 0) return nullptr;
+    struct stat st;
+    if (mustBeOwn && (fstat(fd, &st) != 0 || st.st_uid != geteuid())) {
+        close(fd);
+        errno = EPERM;
+        return nullptr;
+    }
     FILE* fp = fdopen(fd, "w+");
     if (fp == nullptr) {
         close(fd);
@@ -186,12 +196,14 @@ void cutAfter(FILE* fp, off_t written) {
 void setDebug(bool val) { debug = val; }
 bool getDebug() { return debug; }
 
-bool enableLogging(const std::wstring& logLocation) {
+namespace {
+
+bool openLog(const std::wstring& logLocation, bool mustBeOwn) {
     std::wstring path = logLocation + L"/" + RCP_LOG_FILE;
     convertToOsSeparator(path);
     std::string npath;
     wstrtocs(npath, path);
-    FILE* fp = openLogStream(npath);
+    FILE* fp = openLogStream(npath, mustBeOwn);
     if (fp == nullptr) {
         fatalErrorA("RLNCH0019E: Could not open %ls for writing!", path.c_str(), false);
         return false;
@@ -204,7 +216,11 @@ bool enableLogging(const std::wstring& logLocation) {
     return true;
 }
 
-bool dumpLogToTempLocation() { return enableLogging(TEMP_LOG_DIR); }
+}  // namespace
+
+bool enableLogging(const std::wstring& logLocation) { return openLog(logLocation, false); }
+
+bool dumpLogToTempLocation() { return openLog(TEMP_LOG_DIR, true); }
 
 void SvcDebugOutA(const char* fString) {
     if (!debug || fString == nullptr || strlen(fString) >= MAX_DEBUG_FORMAT) return;

@@ -7,6 +7,7 @@
 // end the launch; everything else answers through its 1/0 result and leaves
 // errno as the failing call set it.
 #include <dirent.h>
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/types.h>
 #include <unistd.h>
@@ -26,8 +27,8 @@ const mode_t DIRECTORY_MODE = 0775;
 // Size of the scratch area that receives one scanned item (bytes).
 const size_t READ_SCRATCH_SIZE = 204800;
 
-// fgetws buffer: up to 1000 characters per read plus the terminator.
-const int COPY_BUFFER_CHARS = 1001;
+// Bytes moved per read of a file copy.
+const size_t COPY_BUFFER_BYTES = 8192;
 
 // One line of the removal error list. errno is handed in explicitly because it
 // has to be the value the failing call left, not whatever building the line
@@ -226,42 +227,32 @@ int copyFile(const wchar_t* origFile, const wchar_t* newFile)
     const wchar_t* origText = origFile != nullptr ? origFile : L"";
     const wchar_t* newText = newFile != nullptr ? newFile : L"";
     FILE* in = nullptr;
-    if (origFile != nullptr) {
-        open_wfile(in, origFile, L"r");
-    }
+    open_file(in, origText, L"r");
     if (in == nullptr) {
         fatalErrorA("RLNCH0190E: Unable to open source file %ls to be copied", origText, true);
-        return 0;
     }
-    FILE* out = nullptr;
-    if (newFile != nullptr) {
-        open_wfile(out, newFile, L"w+");
-    }
+    // Bytes, not text: a copy must never fail because the file is not in
+    // the locale's encoding (a launch from the Finder has no LANG at all).
+    const std::wstring work = std::wstring(newText) + WORK_FILE_SUFFIX;
+    FILE* out = newFile != nullptr ? createWorkFile(work) : nullptr;
     if (out == nullptr) {
         fclose(in);
         fatalErrorA("RLNCH0191E: Unable to open destination file %ls to be copied to", newText, true);
-        return 0;
     }
-    wchar_t buffer[COPY_BUFFER_CHARS];
-    while (fgetws(buffer, COPY_BUFFER_CHARS, in) != nullptr) {
-        if (fputws(buffer, out) < 0) {
-            fclose(in);
-            fclose(out);
-            fatalErrorA("RLNCH0192E: Encountered error copying file contents", true);
-            return 0;
-        }
-    }
-    if (!feof(in)) {
-        fclose(in);
-        fclose(out);
-        fatalErrorA("RLNCH0193E: Did not encounter EOF while copying file contents", true);
-        return 0;
-    }
+    char buffer[COPY_BUFFER_BYTES];
+    size_t n;
+    bool written = true;
+    while (written && (n = fread(buffer, 1, sizeof buffer, in)) > 0) written = fwrite(buffer, 1, n, out) == n;
+    const bool readAll = feof(in) != 0;
     fclose(in);
-    // Buffered output can still fail at the final flush (a full disk).
-    if (fclose(out) != 0) {
+    // A write error, or one that only the final flush and close report (a
+    // full disk), leaves no file behind; nor does a read that stopped early.
+    if (!readAll && written) {
+        finishWorkFile(out, work);
+        fatalErrorA("RLNCH0193E: Did not encounter EOF while copying file contents", true);
+    }
+    if (!commitWorkFile(out, work, newText)) {
         fatalErrorA("RLNCH0192E: Encountered error copying file contents", true);
-        return 0;
     }
     return 1;
 }
@@ -290,11 +281,12 @@ int existsA(const char* file)
     if (file == nullptr) {
         return 0;
     }
-    FILE* fp = fopen(file, "rb");
-    if (fp == nullptr) {
+    // Without O_NONBLOCK a FIFO would hold the launch until a writer came.
+    int fd = open(file, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    if (fd < 0) {
         return 0;
     }
-    fclose(fp);
+    close(fd);
     return 1;
 }
 
@@ -384,6 +376,101 @@ void open_wfile(FILE*& inX, const wchar_t* file, const wchar_t* mode)
         fwide(fp, 1);
     }
     inX = fp;
+}
+
+int openRegularFile(const char* path, int flags, int mode)
+{
+    int fd = open(path, flags | O_NONBLOCK | O_CLOEXEC, mode);
+    if (fd < 0) {
+        return -1;
+    }
+    struct stat st;
+    int err = 0;
+    if (fstat(fd, &st) != 0) {
+        err = errno;
+    } else if (!S_ISREG(st.st_mode)) {
+        err = S_ISDIR(st.st_mode) ? EISDIR : EINVAL;
+    }
+    if (err != 0) {
+        close(fd);
+        errno = err;
+        return -1;
+    }
+    return fd;
+}
+
+FILE* createWorkFile(const std::wstring& workPath)
+{
+    std::string path = toNarrow(workPath.c_str());
+    unlink(path.c_str());
+    int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666);
+    if (fd < 0) {
+        return nullptr;
+    }
+    FILE* fp = fdopen(fd, "w");
+    if (fp == nullptr) {
+        const int err = errno;
+        close(fd);
+        unlink(path.c_str());
+        errno = err;
+        return nullptr;
+    }
+    fwide(fp, -1);
+    return fp;
+}
+
+int finishWorkFile(FILE* fp, const std::wstring& workPath)
+{
+    // The error flag stays set after a failed write; the flush and the close
+    // report what the buffer still held.
+    bool ok = ferror(fp) == 0;
+    ok = fflush(fp) == 0 && ok;
+    ok = fclose(fp) == 0 && ok;
+    if (!ok) {
+        const int err = errno;
+        deleteFile(workPath.c_str());
+        errno = err;
+    }
+    return ok ? 1 : 0;
+}
+
+int commitWorkFile(FILE* fp, const std::wstring& workPath, const std::wstring& finalPath)
+{
+    if (!finishWorkFile(fp, workPath)) {
+        return 0;
+    }
+    if (!moveFile(workPath.c_str(), finalPath.c_str())) {
+        const int err = errno;
+        deleteFile(workPath.c_str());
+        errno = err;
+        return 0;
+    }
+    return 1;
+}
+
+bool putWide(FILE* fp, const std::wstring& text)
+{
+    std::string bytes;
+    wstrtocs(bytes, text);
+    return fwrite(bytes.data(), 1, bytes.size(), fp) == bytes.size() && ferror(fp) == 0;
+}
+
+bool readSmallFile(const std::wstring& path, std::string& bytes, size_t limit)
+{
+    std::string narrowPath = toNarrow(path.c_str());
+    int fd = openRegularFile(narrowPath.c_str(), O_RDONLY);
+    if (fd < 0) {
+        return false;
+    }
+    bytes.assign(limit + 1, '\0');
+    size_t got = 0;
+    ssize_t n;
+    while (got < bytes.size() && (n = read(fd, &bytes[got], bytes.size() - got)) > 0) {
+        got += static_cast<size_t>(n);
+    }
+    close(fd);
+    bytes.resize(got);
+    return got <= limit;
 }
 
 const wchar_t* getUserHome(std::wstring& envHome)

@@ -18,49 +18,37 @@
 
 #include "rcp_launcher.h"
 
-namespace {
-
-// Keeps a descriptor out of programs started with execv. The flock belongs to
-// the open file description, which a child would share: a JVM that inherited
-// it could hold the lock for its whole life if this launcher died before
-// unlocking, and every later launcher of the workspace would block on it.
-void closeOnExec(int fd)
-{
-    if (fd < 0) {
-        return;
-    }
-    int flags = fcntl(fd, F_GETFD);
-    if (flags != -1) {
-        fcntl(fd, F_SETFD, flags | FD_CLOEXEC);
-    }
-}
-
-}  // namespace
-
 void createAndOpenLockFile()
 {
     std::string path;
     wcstochar(path, lockFilePath.c_str());
-    // This descriptor only makes sure the file exists; the stream below is the
-    // one that is locked and kept.
-    int fd = open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600);
-    if (fd < 0) {
-        SvcDebugOutA("RLNCH0199E: CreateLockFile failed. errno=%d", errno);
-    } else {
-        close(fd);
-    }
     if (lockFILE != nullptr) {
         // A second call in one process must not leave the first stream (and
         // any lock on it) behind.
         fclose(lockFILE);
         lockFILE = nullptr;
     }
-    open_file(lockFILE, lockFilePath.c_str(), L"r+");
+    // The workspace may be shared with other users, so the lock file is
+    // never reached through a link (whatever the link points to would be
+    // created or overwritten) and must be a regular file. The descriptor is
+    // close-on-exec: the flock belongs to the open file description, and a
+    // JVM that inherited it would hold the lock for its whole life if this
+    // launcher died before unlocking.
+    const int fd = openRegularFile(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW, 0600);
+    if (fd < 0) {
+        const int err = errno;
+        SvcDebugOutA("RLNCH0199E: CreateLockFile failed. errno=%d", err);
+        errno = err;  // the fatal line below reports why
+    } else {
+        lockFILE = fdopen(fd, "r+");
+        if (lockFILE == nullptr) {
+            close(fd);
+        }
+    }
     if (lockFILE == nullptr) {
         fatalErrorA("RLNCH0054E: Error locating platform lock file", true);
-        return;
     }
-    closeOnExec(fileno(lockFILE));
+    fwide(lockFILE, -1);
 }
 
 void lockLockFile(const std::wstring& sidFilePath)

@@ -5,6 +5,7 @@
 // encoding becomes U+DC00 + byte on the way in and that byte again on the way
 // out, so a file name or argument in any encoding reaches the system exactly
 // as it arrived.
+#include <fcntl.h>
 #include <langinfo.h>
 #include <unistd.h>
 
@@ -131,11 +132,25 @@ void convertToOsSeparator(std::wstring& in) { convertBS2S(in); }
 void convertS2BS(std::wstring& in) { replaceAll(in, L'/', BS_CHAR[0]); }
 
 void open_file(FILE*& inX, const wchar_t* file, const wchar_t* mode) {
+    inX = nullptr;
     std::string nfile, nmode;
     wcstochar(nfile, file);
     wcstochar(nmode, mode);
-    inX = fopen(nfile.c_str(), nmode.c_str());
-    if (inX != nullptr) fwide(inX, -1);
+    const int flags = nmode == "r" ? O_RDONLY : nmode == "r+" ? O_RDWR : -1;
+    if (flags == -1) {
+        errno = EINVAL;
+        return;
+    }
+    const int fd = openRegularFile(nfile.c_str(), flags);
+    if (fd < 0) return;
+    inX = fdopen(fd, nmode.c_str());
+    if (inX == nullptr) {
+        const int err = errno;
+        close(fd);
+        errno = err;
+        return;
+    }
+    fwide(inX, -1);
 }
 
 const wchar_t* getEnv(const wchar_t* var, std::wstring& value) {

@@ -7,16 +7,18 @@
 // The tests run as root, for whom permission bits mean nothing. What can be
 // simulated without privileges is simulated with the file system's own
 // shapes: a regular file where a directory is expected, a path through a
-// file, a directory where a file is expected, a link to /dev/full for a full
-// disk. Where only permissions can do it (an unwritable home, a read-only
-// properties file), the launcher runs as the user "nobody" (the sandbox
-// drops privileges in the forked child); those cases are skipped when the
-// tests do not run as root. Not simulated: a rename across file systems and
-// a directory that even root cannot remove (both need mounts or immutable
-// attributes).
+// file, a directory where a file is expected, FIFOs, links and devices where
+// files are expected. Where only permissions can do it (an unwritable home, a
+// read-only properties file), the launcher runs as the user "nobody" (the
+// sandbox drops privileges in the forked child); a full disk is a small
+// tmpfs. Those cases are skipped when the tests do not run as root. Not
+// simulated: a rename across file systems and a directory that even root
+// cannot remove (both need immutable attributes or more mounts).
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/mount.h>
 #include <sys/stat.h>
+#include <sys/statvfs.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -26,6 +28,7 @@
 #include <functional>
 #include <map>
 #include <random>
+#include <set>
 #include <string>
 #include <thread>
 #include <vector>
@@ -151,12 +154,37 @@ TEST(Faults, UnwritableAreasEndWithTheirMessage) {
              ASSERT_EQ(chown(sb.defaultConfig().c_str(), 0, 0), 0);
          },
          "RLNCH0019E: Could not open %C/args.properties for writing!", EACCES},
-        {"disk full under the startup record", false, false,
+        // In a workspace other users may write, the lock file could be a
+        // link to anything: it is never followed, so nothing is created or
+        // overwritten where it points (the file starts with a digit, as a
+        // lock file would).
+        {"lock file is a link to another file", false, false,
+         [](Sandbox& sb, RunOptions&) {
+             writeText(sb.home() + "/victim", "1234 first line\n");
+             makeDirs(sb.defaultWorkspace());
+             ASSERT_EQ(symlink((sb.home() + "/victim").c_str(), (sb.defaultWorkspace() + "/.rcp.lock").c_str()), 0);
+         },
+         "RLNCH0054E: Error locating platform lock file", ELOOP},
+        // A FIFO would block the open for ever, a device be read without end:
+        // files the launcher reads must be regular files.
+        {"launcher properties are a FIFO", false, true,
+         [](Sandbox& sb, RunOptions&) {
+             unlink(sb.launcherProperties().c_str());
+             ASSERT_EQ(mkfifo(sb.launcherProperties().c_str(), 0644), 0);
+         },
+         "RLNCH0014E: Unable to load %P file!", EINVAL},
+        {"per-user installation properties are a FIFO", false, false,
          [](Sandbox& sb, RunOptions&) {
              makeDirs(sb.defaultConfig());
-             ASSERT_EQ(symlink("/dev/full", (sb.defaultConfig() + "/args.properties").c_str()), 0);
+             ASSERT_EQ(mkfifo((sb.defaultConfig() + "/rcpinstall.properties").c_str(), 0644), 0);
          },
-         "RLNCH0020E: Error writing to %C/args.properties file.", ENOSPC},
+         "RLNCH0014E: Unable to load %C/rcpinstall.properties file!", EINVAL},
+        {"base installation properties are a link to /dev/zero", false, false,
+         [](Sandbox& sb, RunOptions&) {
+             unlink((sb.base() + "/rcpinstall.properties").c_str());
+             ASSERT_EQ(symlink("/dev/zero", (sb.base() + "/rcpinstall.properties").c_str()), 0);
+         },
+         "RLNCH0190E: Unable to open source file %S/inst/base/rcpinstall.properties to be copied", EINVAL},
         {"update directory is a regular file", false, false,
          [](Sandbox& sb, RunOptions&) { writeText(sb.defaultConfig() + "/org.eclipse.update", "x\n"); },
          cannotCreate + "%C/org.eclipse.update directory.", EEXIST},
@@ -199,10 +227,6 @@ TEST(Faults, UnwritableAreasEndWithTheirMessage) {
             std::cout << "skipped (needs root to run the launcher as nobody): " << f.name << "\n";
             continue;
         }
-        if (f.err == ENOSPC && !pathExists("/dev/full")) {
-            std::cout << "skipped (no /dev/full on this system): " << f.name << "\n";
-            continue;
-        }
         Sandbox sb;
         sb.setupInstall("user");
         RunOptions o;
@@ -223,6 +247,99 @@ TEST(Faults, UnwritableAreasEndWithTheirMessage) {
         expectKept(homeBefore, sb.home());
         expectKept(instBefore, sb.inst());
     }
+}
+
+// A small tmpfs at a directory of the sandbox, unmounted however the test
+// ends.
+class SmallDisk {
+public:
+    explicit SmallDisk(const std::string& dir) : dir_(dir) { makeDirs(dir); }
+    ~SmallDisk() { unmount(); }
+    bool mountWith(long bytes) {
+        unmount();
+        mounted_ = mount("tmpfs", dir_.c_str(), "tmpfs", 0, ("size=" + std::to_string(bytes)).c_str()) == 0;
+        return mounted_;
+    }
+    // Room for more, or (bytes = 0) exactly what is used now: full.
+    bool resize(long bytes) {
+        struct statvfs v;
+        if (bytes == 0 && statvfs(dir_.c_str(), &v) == 0) bytes = static_cast<long>((v.f_blocks - v.f_bfree) * v.f_frsize);
+        return mount("tmpfs", dir_.c_str(), "tmpfs", MS_REMOUNT, ("size=" + std::to_string(bytes)).c_str()) == 0;
+    }
+    void unmount() {
+        if (mounted_) umount2(dir_.c_str(), MNT_DETACH);
+        mounted_ = false;
+    }
+
+private:
+    std::string dir_;
+    bool mounted_ = false;
+};
+
+// The disk fills at any moment of a first launch: for every amount of free
+// space (in pages), the launch starts the platform or ends with its message,
+// every file it writes for the user is complete or absent (a missing
+// platform.xml is only reported with -debug; a missing per-user
+// rcpinstall.properties ends the launch), and once there is room again the
+// next launch writes exactly what a launch with room writes. A startup record
+// that changed but no longer fits leaves the previous one.
+TEST(Faults, FullDiskLeavesEveryFileCompleteOrAbsent) {
+    if (geteuid() != 0) GTEST_SKIP() << "needs root to mount a small tmpfs";
+    Sandbox sb;
+    // Base files of several pages, so that a copy can be cut half-way.
+    sb.setupInstall("user", "", "# " + std::string(20000, 'p') + "\n");
+    std::string xml = "<config>\n";
+    while (xml.size() < 40000) xml += "  <site url=\"platform:/base/" + std::to_string(xml.size()) + "\"/>\n";
+    sb.writeBase("platform.xml", xml + "</config>\n");
+    SmallDisk disk(sb.path("disk"));
+    const long room = 1 << 20, page = 4096;
+    if (!disk.mountWith(room)) GTEST_SKIP() << "cannot mount a tmpfs here: " << strerror(errno);
+    RunOptions o;
+    o.args = {"-data", sb.path("disk/ws")};
+    const std::string cfg = sb.path("disk/ws/.config"), log = sb.path("disk/ws/logs/rcplauncher.log");
+    ASSERT_EQ(sb.run(o).status, 0);
+    const auto reference = userFiles(cfg);
+    const auto referenceTree = listTree(cfg);
+    ASSERT_EQ(reference.size(), 4u);
+
+    std::set<std::string> endings;
+    for (long pages = 1;; pages++) {  // (a size of 0 means no limit)
+        SCOPED_TRACE(std::to_string(pages) + " pages free");
+        ASSERT_TRUE(disk.mountWith(pages * page));
+        LaunchResult r = sb.run(o);
+        EXPECT_EQ(r.terminal, "");
+        const std::string last = lastLine(r.tmpLogWritten ? r.tmpLog : readText(log));
+        if (r.status == 255) {
+            EXPECT_FALSE(r.hasChild());
+            endings.insert(last.substr(0, last.find(':')));
+        } else {
+            EXPECT_EQ(r.status, 0) << r.describe();
+        }
+        for (const auto& f : userFiles(cfg)) {
+            EXPECT_TRUE(reference.count(f.first)) << "left behind: " << f.first;
+            if (reference.count(f.first)) {
+                EXPECT_EQ(f.second.bytes, reference.at(f.first).bytes) << f.first;
+            }
+        }
+        const bool everything = r.status == 0 && userFiles(cfg).size() == reference.size();
+        ASSERT_TRUE(disk.resize(room));
+        ASSERT_EQ(sb.run(o).status, 0);
+        EXPECT_EQ(listTree(cfg), referenceTree);
+        for (const auto& f : userFiles(cfg)) EXPECT_EQ(f.second.bytes, reference.at(f.first).bytes) << f.first;
+        if (everything || ::testing::Test::HasFailure() || pages > 64) break;
+    }
+    // Among the endings: the per-user properties could not be completed.
+    EXPECT_TRUE(endings.count("RLNCH0014E")) << ::testing::PrintToString(endings);
+
+    const std::string record = readText(cfg + "/args.properties");
+    ASSERT_TRUE(disk.resize(0));
+    RunOptions changed = o;
+    changed.args.push_back("-changed");
+    LaunchResult r = sb.run(changed);
+    EXPECT_EQ(r.status, 255);
+    EXPECT_EQ(lastLine(readText(log)), errorLine("RLNCH0020E: Error writing to " + cfg + "/args.properties file.", ENOSPC));
+    EXPECT_EQ(readText(cfg + "/args.properties"), record);
+    EXPECT_EQ(listTree(cfg), referenceTree);
 }
 
 // Waits until every process this test started or adopted has ended: a child

@@ -56,48 +56,55 @@ void removeEntry(const std::string& path) {
     else unlink(path.c_str());
 }
 
-// A link at the fallback log's path, planted before a launch that ends
-// before its log directory is known ("-version"): the launch ends as always,
-// and neither the link nor the file it points to changes.
-TEST(SharedTmp, FallbackLogNeverWritesThroughAPlantedLink) {
+// An entry planted at the fallback log's path before a launch that ends
+// before its log directory is known (no base location, with -debug and more
+// than a pipe holds queued): the launch ends as always (no hang on a FIFO),
+// the entry stays exactly as it was, and no line reaches a file through a
+// link or a file another user made (who could read the queued arguments).
+TEST(SharedTmp, FallbackLogIsOnlyEverOurOwnFile) {
     const int self = static_cast<int>(geteuid());
     struct Case {
         const char* name;
-        int linkOwner;     // who planted the link
-        bool asNobody;     // the launcher's user
+        int owner;      // who planted the entry
+        bool asNobody;  // the launcher's user
+        std::function<void(const std::string& victim)> plant;
     };
+    auto link = [](const std::string& victim) { ASSERT_EQ(symlink(victim.c_str(), kTmpLog), 0); };
     const Case cases[] = {
-        {"the user's own link", self, false},
-        {"another user's link, launcher run by root", kNobody, false},
-        {"link of /tmp's owner, launcher run by a user who may write the target", 0, true},
+        {"the user's own link", self, false, link},
+        {"another user's link, launcher run by root", kNobody, false, link},
+        {"link of /tmp's owner, launcher run by a user who may write the target", 0, true, link},
+        {"a FIFO", self, false, [](const std::string&) { ASSERT_EQ(mkfifo(kTmpLog, 0666), 0); }},
+        {"another user's file open to all", kNobody, false,
+         [](const std::string&) { writeText(kTmpLog, "another user's log\n", 0666); }},
     };
     for (const Case& c : cases) {
         SCOPED_TRACE(c.name);
-        if ((c.asNobody || c.linkOwner != self) && geteuid() != 0) {
+        if ((c.asNobody || c.owner != self) && geteuid() != 0) {
             std::cout << "skipped (needs root): " << c.name << "\n";
             continue;
         }
         Sandbox sb;
-        sb.setupInstall("user");
+        sb.writeLauncherProperties("rcp.install.id=ID42\n# " + std::string(70000, 'q') + "\n");
         const std::string victim = sb.path("victim");
         writeText(victim, "another file's content\n", 0666);
         RunOptions o;
-        o.args = {"-version"};
+        o.args = {"-debug"};
         if (c.asNobody) o.uid = o.gid = kNobody;
 
         sb.beginRuns();  // removes any earlier log
-        ASSERT_EQ(symlink(victim.c_str(), kTmpLog), 0);
-        ASSERT_EQ(lchown(kTmpLog, static_cast<uid_t>(c.linkOwner), static_cast<gid_t>(c.linkOwner)), 0);
-        const Entry link = entryAt(kTmpLog);
+        c.plant(victim);
+        ASSERT_EQ(lchown(kTmpLog, static_cast<uid_t>(c.owner), static_cast<gid_t>(c.owner)), 0);
+        const Entry planted = entryAt(kTmpLog);
         const Entry target = entryAt(victim);
         const int status = sb.waitFor(sb.start(o));
-        const Entry linkAfter = entryAt(kTmpLog);
+        const Entry after = entryAt(kTmpLog);
         const Entry targetAfter = entryAt(victim);
         unlink(kTmpLog);
 
         EXPECT_EQ(status, 255);
         EXPECT_EQ(sb.terminalOutput(), "");
-        EXPECT_TRUE(linkAfter == link) << "the planted link was replaced";
+        EXPECT_TRUE(after == planted) << "the planted entry was replaced or written: " << after.content;
         EXPECT_TRUE(targetAfter == target) << "written through the link: " << targetAfter.content;
     }
 }

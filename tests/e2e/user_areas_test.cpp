@@ -18,7 +18,9 @@ const char* const kPlatformFiles[] = {"config.ini", "rcpinstall.properties", "or
 // A first launch into an empty home creates exactly the user's areas and
 // files; a second launch leaves every per-user file alone even though the
 // installation's copies changed in between, and rewrites its log and startup
-// record however long the earlier text was.
+// record however long the earlier text was. The base files begin with empty
+// lines and hold bytes in two encodings, and the first launch has no LANG
+// (as when the Finder starts it): the copies carry every byte unchanged.
 TEST(UserAreas, FirstLaunchCreatesThePerUserFilesAndLaterLaunchesKeepThem) {
     Sandbox sb;
     sb.setupInstall("user", "com.kel.rcp.core.locale=fr_FR\n",
@@ -27,10 +29,17 @@ TEST(UserAreas, FirstLaunchCreatesThePerUserFilesAndLaterLaunchesKeepThem) {
                     "    continued\n"
                     "os.value.linux=tux\n"
                     "\n"
-                    "# trailing comment\n");
+                    "# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n");
+    const std::string configIni = Sandbox::standardConfigIni() + "# caf\xe9 \xc3\xb6\n";
+    sb.writeBase("rcpinstall.properties", "\n\n" + readText(sb.base() + "/rcpinstall.properties"));
+    sb.writeBase("platform.xml", "\n" + Sandbox::standardPlatformXml() + "<!-- caf\xe9 \xc3\xb6 -->\n");
+    sb.writeBase("config.ini", configIni);
     // "-resetconfig" on a first launch resets nothing and is not recorded.
     const std::string longArg = "/a/long/argument/" + std::string(3000, 'x');
-    LaunchResult first = sb.run({"-resetconfig", "-debug", "a b", longArg});
+    RunOptions o;
+    o.args = {"-resetconfig", "-debug", "a b", longArg};
+    o.env["LANG"] = "";
+    LaunchResult first = sb.run(o);
     ASSERT_EQ(first.status, 0) << first.describe();
     ASSERT_TRUE(first.hasChild());
     EXPECT_FALSE(first.tmpLogWritten);
@@ -50,14 +59,15 @@ TEST(UserAreas, FirstLaunchCreatesThePerUserFilesAndLaterLaunchesKeepThem) {
     EXPECT_EQ(readText(cfg + "/args.properties"),
               "arg0=" + sb.launcher() + "\narg1=-debug\narg2=a b\narg3=" + longArg + "\nargc=4\n");
     EXPECT_NE(first.log.find(longArg), std::string::npos) << "the debug log shows the child's arguments";
-    EXPECT_EQ(readText(cfg + "/config.ini"), Sandbox::standardConfigIni());
+    EXPECT_EQ(readText(cfg + "/config.ini"), configIni);
     EXPECT_EQ(readText(cfg + "/org.eclipse.update/platform.xml"),
               "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n"
-              "<site url=\"platform:/base/\" enabled=\"true\">\n<feature>\n</site>\n</config>\n");
+              "<site url=\"platform:/base/\" enabled=\"true\">\n<feature>\n</site>\n</config>\n"
+              "<!-- caf\xe9 \xc3\xb6 -->\n");
     EXPECT_EQ(readText(cfg + "/rcpinstall.properties"),
               Sandbox::standardInstallProperties() +
                   "os.value=mac\n"
-                  "# trailing comment\n"
+                  "# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n"
                   "rcp.install.id=ID42\n"
                   "vm=${rcp.home}/jre/bin/java\n"
                   "rcp.base.location=${rcp.home}/base\n"

@@ -107,7 +107,7 @@ TEST_F(AreasTest, UserPropertiesAreFilteredAndCompleted) {
     const std::tuple<installCfg, std::string, std::string> cases[] = {
         {user, "k=v\n", "k=user\n" + block},  // the configuration's own base copy
         {service, "k=v\n", "k=v\n" + block},  // none for a service
-        {service, "\nk=v\n", block},          // a leading empty line stops the copy, no hang
+        {service, "\n\n  k=v\n", "k=v\n" + block},  // leading empty lines are skipped like other blank lines
         {service, std::string(2030, 'z'), std::string(2024, 'z') + "\nzzzzzz\n" + block}};
     for (const auto& [config, base, result] : cases) {
         eConfig = config;
@@ -133,7 +133,7 @@ TEST_F(AreasTest, PlatformXml) {
     const std::tuple<installCfg, const wchar_t*, std::string, int, bool, const char*> cases[] = {
         {user, nullptr, base, 0, true, copied}, {user, L"false", base, 0, true, nullptr}, {user, L"False", base, 0, true, copied},
         {userpb, nullptr, base, 0, false, nullptr}, {user, nullptr, "", -1, true, nullptr},
-        {user, nullptr, "\n<a/>\n", 0, true, ""}};  // a leading empty line ends the copy, no hang
+        {user, nullptr, "\n<a/>\n", 0, true, "<a/>\n"}};  // a leading empty line is skipped
     for (const auto& [cfg, policy, text, result, dir, expected] : cases) {
         eConfig = cfg;
         userFirstLaunch = false;
