@@ -219,6 +219,17 @@ report_value() { sed -n "s/^$1=//p" "$2"; }
 # The line after the line that is exactly label.
 line_after() { awk -v label="$1" 'found { print; exit } $0 == label { found = 1 }' "$2"; }
 no_files_named() { [ -z "$(find "$1" -name "$2")" ]; }
+# Each entry of a tree: "dir/", or "file mode" with the mode as ls shows it.
+tree_listing() {
+    (cd "$1" && find . -mindepth 1 | LC_ALL=C sort | while read -r path; do
+        if [ -d "$path" ]; then
+            echo "${path#./}/"
+        else
+            # shellcheck disable=SC2012 # the names are known; find has no portable mode output
+            echo "${path#./} $(ls -ld "$path" | cut -c 1-10)"
+        fi
+    done)
+}
 
 # What cmake --install laid out: the launcher beside the sample installation,
 # with the modes cmake gives programs and files.
@@ -226,16 +237,16 @@ check_installed_tree() {
     local dir=$DEMO_DIR/installed
     check_same "cmake --install lays out the launcher and the sample installation" \
         "base/
-base/config.ini 644
-base/platform.xml 644
-base/rcpinstall.properties 644
+base/config.ini -rw-r--r--
+base/platform.xml -rw-r--r--
+base/rcpinstall.properties -rw-r--r--
 eclipse/
 eclipse/plugins/
-eclipse/plugins/README.txt 644
+eclipse/plugins/README.txt -rw-r--r--
 rcp/
-rcp/rcplauncher 755
-rcp/rcplauncher.properties 644" \
-        "$(cd "$dir" && find . -mindepth 1 -type d -printf '%P/\n' -o -printf '%P %m\n' | LC_ALL=C sort)"
+rcp/rcplauncher -rwxr-xr-x
+rcp/rcplauncher.properties -rw-r--r--" \
+        "$(tree_listing "$dir")"
     check_that "the installed sample files are those of demo/inst" \
         diff -r -x rcplauncher "$ROOT/demo/inst" "$dir"
     check_that "the installed launcher is the one built" cmp "$BUILD_DIR/rcplauncher" "$dir/rcp/rcplauncher"
