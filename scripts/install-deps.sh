@@ -4,8 +4,8 @@
 #
 # Debian and Ubuntu: apt-get (through sudo when not run as root), including a
 # JVM, the Java compiler and Debian's Equinox launcher and framework for the
-# real-platform test and the demo. macOS: Homebrew formulae; Equinox has none,
-# so the real-platform test skips itself there.
+# demo. macOS: Homebrew formulae; Equinox has none, so scripts/test.sh does not
+# run the demo there.
 set -euo pipefail
 
 if [ "$(uname -s)" = Darwin ]; then

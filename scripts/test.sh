@@ -1,8 +1,9 @@
 #!/usr/bin/env bash
 # Builds and runs every test: a normal build with warnings as errors, its
 # end-to-end suite once more with the launcher under valgrind, the same suite
-# under AddressSanitizer + UndefinedBehaviorSanitizer, and short bounded
-# fuzzing runs built with clang.
+# under AddressSanitizer + UndefinedBehaviorSanitizer, short bounded fuzzing
+# runs built with clang, and last the demo, which installs the normal build and
+# checks it on a real Equinox platform.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 root=$(pwd)
@@ -45,4 +46,13 @@ elif [ -f "$root/fuzz/CMakeLists.txt" ]; then
     -DRCP_FUZZ=ON >/dev/null
   cmake --build "$root/build-fuzz" -j"$jobs"
   (cd "$root/build-fuzz" && ctest -L fuzz --output-on-failure)
+fi
+
+if [ "$(uname -s)" = Darwin ]; then
+  # Homebrew has no Equinox.
+  echo "=== Demo on a real platform skipped on macOS ==="
+else
+  # It reuses build/, whose cached options stay as configured above.
+  echo "=== Demo on a real platform ==="
+  BUILD_DIR="$root/build" scripts/demo.sh
 fi

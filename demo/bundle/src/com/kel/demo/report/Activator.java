@@ -19,8 +19,9 @@ import org.osgi.framework.ServiceReference;
  * Reports what the platform was started with, so that a launch can be checked
  * from outside: the system properties the launcher sets, the areas the
  * framework runs in, the program arguments the framework left for the
- * application, the JVM's own argument vector and the environment variables
- * the launcher manages.
+ * application, the JVM's own argument vector, the environment variables the
+ * launcher manages, and the platform's process id (which the platform lock
+ * names).
  *
  * The report goes to standard output and to
  * &lt;configuration area&gt;/com.kel.demo.report/report.properties, one
@@ -66,6 +67,7 @@ public final class Activator implements BundleActivator {
         for (int i = 0; i < jvmArgs.size(); i++) {
             line(report, "jvm.arg." + i, jvmArgs.get(i));
         }
+        line(report, "process.pid", Long.toString(ProcessHandle.current().pid()));
 
         System.out.print(report);
         System.out.flush();
