@@ -96,7 +96,7 @@ void getProperties(const wstring& propFilePath, std::vector<String>& propArray);
 String findProperty(const wchar_t* name, const std::vector<String>& propArray);
 // Borrowed key/value pointers, closed by an entry pointing to "". free() it.
 String* findProperties(const wchar_t* prefix, const std::vector<String>& propArray);
-void removeDuplicates(std::vector<String>& args, const wchar_t* str);
+// Removes the second occurrence of str (only that one element), if any.
 void removeDuplicates(std::vector<wstring>& args, const wchar_t* str);
 void FilterProp(wstring& key);
 void FilterValue(wstring& value);
@@ -126,11 +126,9 @@ bool replaceAllPlaceholders(const wstring& workspaceLocation, const wstring& ins
 void replacePlaceholdersInRcpInstallProp(wstring workspaceLocation, wstring installDir,
                                          std::vector<String>& rcpInstallPropertiesArray);
 // Changed entries of argv (and cargv) point to expanded copies that live until
-// the process ends or releaseExpandedArgs is called.
+// the process ends.
 void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wchar_t** argv, wchar_t** cargv,
                                int argc);
-// Frees the expanded copies; no argument vector may point to them afterwards.
-void releaseExpandedArgs();
 // Only the first "${rcp.home}": the base location's later ones are left to
 // the platform.
 void replaceFirstRcpHome(wstring& text, const wstring& installDir);

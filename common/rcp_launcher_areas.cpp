@@ -2,6 +2,7 @@
 // and the configuration area for every install configuration, and whether an
 // existing configuration area was written by a different installation.
 // Nothing here creates directories; the startup sequence does that.
+#include <ctime>
 #include <cwchar>
 #include <string>
 #include <vector>
@@ -20,6 +21,14 @@ void removeOneTrailingSeparator(wstring& path) {
 }
 
 }  // namespace
+
+unsigned long getTick() { return static_cast<unsigned long>(std::time(nullptr)); }
+
+wchar_t* getTickString(wchar_t* wsticks, size_t size) {
+    if (wsticks == nullptr || size == 0) return wsticks;
+    if (swprintf(wsticks, size, L"%lu", getTick()) < 0) wsticks[0] = 0;  // too small: empty, never unterminated
+    return wsticks;
+}
 
 String getInstallID(wstring rcp_launcher_properties_file, std::vector<String>& rcpLauncherPropertiesArray) {
     String installID = findProperty(RCP_INSTALL_ID_PROPERTY, rcpLauncherPropertiesArray);

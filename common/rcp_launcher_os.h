@@ -56,11 +56,6 @@ void fatalErrorW(const wchar_t* mgs, bool bExit);
 inline constexpr size_t TEMP_OUT_BUFFER_SIZE = 1024;
 extern char tempOutBuffer[TEMP_OUT_BUFFER_SIZE];
 
-// For tests and diagnostics: the text still waiting in the queue, and a way to
-// put the module back to its state at process start (queue empty, log closed,
-// debug on).
-const std::string& getLogQueue();
-void resetLoggingForTest();
 
 // ===================== String and environment utilities (rcp_launcher_utils_macos)
 // Conversions never fail on bad input: a byte that is not valid in the

@@ -8,6 +8,7 @@
 #include <cwchar>
 
 #include "rcp_launcher.h"
+#include "rcp_launcher_testing.h"
 
 namespace {
 
@@ -219,7 +220,7 @@ void replacePlaceholdersInRcpInstallProp(wstring workspaceLocation, wstring inst
         if (replaceAllPlaceholders(workspaceLocation, installDir, value, rcpInstallPropertiesArray)) {
             expandedTotal += value.length();
             if (expandedTotal > MAX_EXPANDED_TOTAL) substitutionInvalid(value);
-            String expanded = initMemString(newString(value.length() + 1), value.c_str());
+            String expanded = copyString(value.c_str());
             freeString(rcpInstallPropertiesArray[i]);
             rcpInstallPropertiesArray[i] = expanded;
         }
@@ -239,7 +240,7 @@ void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wc
         wstring arg = argv[i];
         if (replaceStdPlaceholders(workspaceLocation, installDir, arg)) {
             // The old argument is not freed: it belongs to whoever built argv.
-            String changed = initMemString(newString(arg.length() + 1), arg.c_str());
+            String changed = copyString(arg.c_str());
             expandedArgs.strings.push_back(changed);
             argv[i] = changed;
             cargv[i] = changed;

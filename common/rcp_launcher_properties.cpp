@@ -26,12 +26,6 @@ wchar_t emptyEntry[1] = {0};
 
 bool isBlank(wchar_t c) { return c == L' '; }
 
-String copyToString(const wstring& text) {
-    // wcscat stops at an embedded NUL (from "\u0000"): the stored copy is cut
-    // there, which is the documented effect of such an escape.
-    return initMemString(newString(text.length() + 1), text.c_str());
-}
-
 // The value of a "\u" escape: the (at most) four characters after "\u" read
 // as a hexadecimal number. A sign in front of the digits would make the
 // unsigned conversion wrap; only the low 16 bits can be meant.
@@ -199,13 +193,14 @@ void getProperties(const wstring& propFilePath, std::vector<String>& propArray) 
         if (valueContinuedOnNextLine) continue;
 
         FilterProp(attributeq);
-        String key = copyToString(attributeq);
+        String key = copyString(attributeq.c_str());
         SvcDebugOutW(L"RLNCH0023I:   attrib = \"%s\"", key);
         propArray.push_back(key);
         attributeq.clear();
 
         FilterValue(valueq);
-        String value = copyToString(valueq);
+        // A NUL from "\u0000" cuts the stored copy there.
+        String value = copyString(valueq.c_str());
         SvcDebugOutW(L"RLNCH0024I:   value  = \"%s\"", value);
         propArray.push_back(value);
         valueq.clear();
@@ -250,19 +245,6 @@ String* findProperties(const wchar_t* prefix, const std::vector<String>& propArr
     }
     result[count] = emptyEntry;
     return result;
-}
-
-void removeDuplicates(std::vector<String>& args, const wchar_t* str) {
-    if (str == nullptr) return;
-    bool seen = false;
-    for (size_t i = 0; i < args.size(); ++i) {
-        if (args[i] == nullptr || wcscmp(args[i], str) != 0) continue;
-        if (seen) {
-            args.erase(args.begin() + static_cast<std::ptrdiff_t>(i));  // not freed: the caller owns it
-            return;
-        }
-        seen = true;
-    }
 }
 
 void removeDuplicates(std::vector<wstring>& args, const wchar_t* str) {

@@ -1,33 +1,12 @@
 // The startup record (args.properties), which lets the platform start the
-// launcher again exactly as it was started, and a few small locations and
-// values the other modules need: the log directory of a workspace, the path
-// of a per-configuration template file and the time stamp used for new
-// installation identifiers.
-#include <sys/time.h>
-
+// launcher again exactly as it was started, and the log directory of a
+// workspace.
 #include <cwchar>
 #include <string>
 
 #include "rcp_launcher.h"
 
 namespace {
-
-// Template files live below <core>/config/<sub-folder>; the sub-folder
-// depends on the install configuration.
-const wchar_t* coreSubFolder() {
-    switch (eConfig) {
-        case multiuser_service:
-            return CORE_SUBDIR_MUSERVICE;
-        case user:
-        case multiuser:
-        case lockdown:
-            return CORE_SUBDIR_USER;
-        case userpb:
-            return CORE_SUBDIR_PBUILDER;
-        default:
-            return L"";
-    }
-}
 
 // One escaped "key=value" line of the record.
 void appendRecordLine(wstring& record, const wstring& key, const wstring& value) {
@@ -85,29 +64,4 @@ void writeStartupArgs(int argc, wchar_t** argv, const wstring& configLocation) {
 void getLogLocation(wstring& logLocation, const wstring& workspaceLocation) {
     logLocation = workspaceLocation + L"/" + LOG_DIR;
     convertToOsSeparator(logLocation);
-}
-
-wstring getCoreFileLocation(const wstring& coreLocation, const wchar_t* filename) {
-    const wstring name = filename != nullptr ? filename : L"";
-    // An empty sub-folder deliberately leaves "config//name": the path is
-    // still valid and matches what existing installations expect.
-    wstring candidate = coreLocation + L"/" + CORE_CONFIG_DIR + L"/" + coreSubFolder() + L"/" + name;
-    convertToOsSeparator(candidate);
-    if (exists(candidate.c_str())) return candidate;
-
-    wstring fallback = coreLocation + L"/" + name;
-    convertToOsSeparator(fallback);
-    return fallback;
-}
-
-unsigned long getTick() {
-    struct timeval tv {};
-    gettimeofday(&tv, nullptr);
-    return static_cast<unsigned long>(tv.tv_sec);
-}
-
-wchar_t* getTickString(wchar_t* wsticks, size_t size) {
-    if (wsticks == nullptr || size == 0) return wsticks;
-    if (swprintf(wsticks, size, L"%lu", getTick()) < 0) wsticks[0] = 0;  // too small: empty, never unterminated
-    return wsticks;
 }

@@ -10,6 +10,23 @@
 
 namespace {
 
+// Template files live below <core>/config/<sub-folder>; the sub-folder
+// depends on the install configuration.
+const wchar_t* coreSubFolder() {
+    switch (eConfig) {
+        case multiuser_service:
+            return CORE_SUBDIR_MUSERVICE;
+        case user:
+        case multiuser:
+        case lockdown:
+            return CORE_SUBDIR_USER;
+        case userpb:
+            return CORE_SUBDIR_PBUILDER;
+        default:
+            return L"";
+    }
+}
+
 // The launcher properties without which the per-user file cannot be
 // completed (RLNCH0008E).
 constexpr const wchar_t* REQUIRED_LAUNCHER_VALUES[] = {RCP_INSTALL_ID_PROPERTY, JVM_LOCATION, RCP_BASE_LOC_PROPERTY,
@@ -59,6 +76,19 @@ void writeCopiedLine(FILE* out, const wstring& line) {
 }
 
 }  // namespace
+
+wstring getCoreFileLocation(const wstring& coreLocation, const wchar_t* filename) {
+    const wstring name = filename != nullptr ? filename : L"";
+    // An empty sub-folder deliberately leaves "config//name": the path is
+    // still valid and matches what existing installations expect.
+    wstring candidate = coreLocation + L"/" + CORE_CONFIG_DIR + L"/" + coreSubFolder() + L"/" + name;
+    convertToOsSeparator(candidate);
+    if (exists(candidate.c_str())) return candidate;
+
+    wstring fallback = coreLocation + L"/" + name;
+    convertToOsSeparator(fallback);
+    return fallback;
+}
 
 wstring createRCPInstallProps(const wstring& workspaceLocation, const wstring& configLocation,
                               const wstring& baseLocation, const wstring& installDir, std::vector<String> propsArray) {

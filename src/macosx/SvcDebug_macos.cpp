@@ -13,6 +13,7 @@
 #include <string>
 
 #include "rcp_launcher.h"
+#include "rcp_launcher_testing.h"
 
 char tempOutBuffer[TEMP_OUT_BUFFER_SIZE];
 

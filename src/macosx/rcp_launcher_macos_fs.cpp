@@ -52,90 +52,21 @@ std::string toNarrow(const wchar_t* path)
     return out;
 }
 
-// Checks the caller's scanf format and returns a copy that can only ever write
-// into the scratch area: exactly one assigning conversion of the kinds s, c or
-// [...] (no length modifier), with a field width that fits the scratch area
-// (a missing width is supplied). Returns false for anything else, which
-// would make fscanf write through arguments that do not exist.
-bool boundedFormat(const std::string& fmt, std::string& out, size_t& width)
+// The two line formats the launcher reads with, in the C library's form,
+// converted once; each converts one item of at most 2024 bytes, which the
+// scratch area holds. Any other format is refused rather than handed to
+// fscanf, which would write through arguments that were never passed.
+const char* lineFormat(const wchar_t* mode)
 {
-    out.clear();
-    width = 0;
-    int assigning = 0;
-    size_t i = 0;
-    while (i < fmt.size()) {
-        char ch = fmt[i];
-        out += ch;
-        ++i;
-        if (ch != '%') {
-            continue;
-        }
-        if (i < fmt.size() && fmt[i] == '%') {
-            out += '%';
-            ++i;
-            continue;
-        }
-        bool suppressed = false;
-        if (i < fmt.size() && fmt[i] == '*') {
-            suppressed = true;
-            out += '*';
-            ++i;
-        }
-        size_t start = i;
-        size_t w = 0;
-        while (i < fmt.size() && fmt[i] >= '0' && fmt[i] <= '9') {
-            if (w < READ_SCRATCH_SIZE) {
-                w = w * 10 + static_cast<size_t>(fmt[i] - '0');
-            }
-            ++i;
-        }
-        bool hasWidth = i > start;
-        if (i >= fmt.size()) {
-            return false;
-        }
-        char conv = fmt[i];
-        if (conv != 's' && conv != 'c' && conv != '[') {
-            // Length modifiers and numeric conversions are not expected here.
-            if (suppressed && (conv == 'd' || conv == 'i' || conv == 'u' || conv == 'x')) {
-                out.append(fmt, start, i - start + 1);
-                ++i;
-                continue;
-            }
-            return false;
-        }
-        if (!suppressed) {
-            ++assigning;
-            if (!hasWidth) {
-                w = (conv == 'c') ? 1 : READ_SCRATCH_SIZE - 1;
-            }
-            if (w == 0 || w >= READ_SCRATCH_SIZE) {
-                return false;
-            }
-            width = w;
-            out += std::to_string(w);
-        } else {
-            out.append(fmt, start, i - start);
-        }
-        out += conv;
-        ++i;
-        if (conv == '[') {
-            // The scan set: a leading '^' and a leading ']' belong to the set.
-            if (i < fmt.size() && fmt[i] == '^') {
-                out += fmt[i++];
-            }
-            if (i < fmt.size() && fmt[i] == ']') {
-                out += fmt[i++];
-            }
-            while (i < fmt.size() && fmt[i] != ']') {
-                out += fmt[i++];
-            }
-            if (i >= fmt.size()) {
-                return false;
-            }
-            out += fmt[i++];
-        }
+    static const std::string propLine = toNarrow(PROP_LINE_FORMAT);
+    static const std::string templateLine = toNarrow(LINE_SCAN_FORMAT);
+    if (wcscmp(mode, PROP_LINE_FORMAT) == 0) {
+        return propLine.c_str();
     }
-    return assigning == 1;
+    if (wcscmp(mode, LINE_SCAN_FORMAT) == 0) {
+        return templateLine.c_str();
+    }
+    return nullptr;
 }
 
 }  // namespace
@@ -330,33 +261,12 @@ int readFile(FILE* inX, const wchar_t* mode, std::wstring& inputLineX)
     // The properties reader calls this once per line; one scratch area serves
     // every call instead of a fresh 200 KB allocation each time.
     static char scratch[READ_SCRATCH_SIZE];
-    // A read loop passes the same format on every call: it is converted and
-    // checked again only when it changes.
-    static std::wstring lastMode;
-    static std::string safeFormat;
-    static size_t width = 0;
-    static bool formatOk = false;
-    static bool checked = false;
     inputLineX.clear();
-    if (inX == nullptr || mode == nullptr) {
+    const char* format = mode != nullptr ? lineFormat(mode) : nullptr;
+    if (inX == nullptr || format == nullptr) {
         return EOF;
     }
-    if (!checked || lastMode != mode) {
-        std::string format;
-        wcstochar(format, mode);
-        formatOk = boundedFormat(format, safeFormat, width);
-        lastMode = mode;
-        checked = true;
-    }
-    if (!formatOk) {
-        // A format that could write past the scratch area (or through a
-        // missing argument) is never handed to fscanf; ending the caller's read
-        // loop is the only safe answer.
-        return EOF;
-    }
-    scratch[0] = '\0';
-    scratch[width] = '\0';  // %c conversions do not terminate their field
-    int result = fscanf(inX, safeFormat.c_str(), scratch);
+    int result = fscanf(inX, format, scratch);
     if (result >= 1) {
         chartowstr(scratch, inputLineX);
     }

@@ -14,6 +14,7 @@
 #include <cerrno>
 #include <climits>
 #include <cstdio>
+#include <cstdlib>
 #include <string>
 
 #include "rcp_launcher.h"
@@ -112,53 +113,32 @@ void unlockLockFile()
     }
 }
 
-// Reads the id the way fscanf("%ld") would (blanks skipped, optional sign,
-// digits), but without the undefined behaviour of an out-of-range number:
-// a value that does not fit is clamped like strtol does. Returns EOF when the
-// file holds nothing but white space, 0 when the first non-blank is not a
-// number, 1 with *pidOut set otherwise.
+// Reads the id the way fscanf("%ld") would: blanks skipped, then a number.
+// Returns EOF when the file holds nothing but white space, 0 when the first
+// non-blank is not a number, 1 with *pidOut set otherwise. A number too long
+// for a long is clamped (and names no process).
 int readLockFilePid(long* pidOut)
 {
     if (lockFILE == nullptr || fseek(lockFILE, 0, SEEK_SET) != 0) {
         return EOF;
     }
     clearerr(lockFILE);
-    int ch = fgetc(lockFILE);
-    while (ch != EOF && isspace(ch)) {
-        ch = fgetc(lockFILE);
+    int ch;
+    while ((ch = fgetc(lockFILE)) != EOF && isspace(ch)) {
     }
     if (ch == EOF) {
         return EOF;
     }
-    bool negative = false;
-    if (ch == '+' || ch == '-') {
-        negative = (ch == '-');
-        ch = fgetc(lockFILE);
+    std::string number(1, static_cast<char>(ch));
+    while (number.size() < 32 && (ch = fgetc(lockFILE)) != EOF && isdigit(ch)) {
+        number += static_cast<char>(ch);
     }
-    if (ch == EOF || !isdigit(ch)) {
+    char* end = nullptr;
+    const long value = strtol(number.c_str(), &end, 10);
+    if (end == number.c_str()) {
         return 0;
     }
-    unsigned long magnitude = 0;
-    const unsigned long limit = negative ? static_cast<unsigned long>(LONG_MAX) + 1UL : LONG_MAX;
-    while (ch != EOF && isdigit(ch)) {
-        unsigned long digit = static_cast<unsigned long>(ch - '0');
-        if (magnitude > (limit - digit) / 10) {
-            magnitude = limit;
-        } else {
-            magnitude = magnitude * 10 + digit;
-        }
-        ch = fgetc(lockFILE);
-    }
-    long value;
-    if (negative) {
-        value = magnitude == static_cast<unsigned long>(LONG_MAX) + 1UL ? LONG_MIN
-                                                                        : -static_cast<long>(magnitude);
-    } else {
-        value = static_cast<long>(magnitude);
-    }
-    if (pidOut != nullptr) {
-        *pidOut = value;
-    }
+    *pidOut = value;
     return 1;
 }
 

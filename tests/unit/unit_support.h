@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "rcp_launcher.h"
+#include "rcp_launcher_testing.h"
 #include "test_util.h"
 
 using namespace rcptest;
