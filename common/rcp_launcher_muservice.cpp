@@ -16,22 +16,23 @@ void makeServiceDirectory(const wstring& dir) {
 }
 
 // A new provisioning level invalidates the JVM's shared class cache. A failed
-// clean-up is reported but does not stop the launch.
+// clean-up is reported, as one error block with the list inside, but does not
+// stop the launch.
 void cleanSharedClasses(std::vector<String>& rcpInstallPropertiesArray,
                         std::vector<String>& rcpLauncherPropertiesArray) {
     if (!isNewProvisioningLevel(findProperty(PROV_MANIFEST_VERSION, rcpInstallPropertiesArray),
                                 findProperty(PROV_MANIFEST_VERSION, rcpLauncherPropertiesArray)))
         return;
     String sharedClasses = findProperty(SHARECLASSES_PROPERTY, rcpInstallPropertiesArray);
+    // An empty value names no directory: there is nothing to empty, and
+    // nothing worth an error block either.
     if (sharedClasses == nullptr || sharedClasses[0] == L'\0') return;
     wstring errlist;
-    if (!removeDirectoryContents(wstring(sharedClasses), errlist)) {
-        fatalErrorA("\nRLNCH0086E begin: Error removing shared classes directory\n%ls\n", errlist.c_str(), false);
-        fatalErrorA(
-            "RLNCH0087E end: Unable to remove all files in the shared classes directory. Please correct the "
-            "problems listed above",
-            false);
-    }
+    if (!removeDirectoryContents(wstring(sharedClasses), errlist))
+        fatalErrorA("\nRLNCH0086E begin: Error removing shared classes directory\n%ls\n"
+                    "RLNCH0087E end: Unable to remove all files in the shared classes directory. Please correct the "
+                    "problems listed above",
+                    errlist.c_str(), false);
 }
 
 }  // namespace
