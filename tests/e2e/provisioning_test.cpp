@@ -1,8 +1,8 @@
 // Provisioning launches: a user's first launch, a new manifest level and the
 // installer's request each run the provisioning child in its own command-line
 // order, wait for it, release the lock and exit without starting the
-// platform; an unchanged level starts the platform as usual, and so does a
-// launcher that finds a platform running.
+// platform; an unchanged level (or none shipped) starts the platform as
+// usual, and so does a launcher that finds a platform running.
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <unistd.h>
