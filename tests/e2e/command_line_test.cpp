@@ -138,7 +138,6 @@ TEST(CommandLine, MultiUserServiceStart) {
         "-initMUService", "-debug", "-data", ws, "-configuration", ws + "/.config", "-application", "com.kel.demo.app",
         "-XstartOnFirstThread"};
     EXPECT_EQ(r.child().argv, argv);
-    EXPECT_EQ(r.child().env.at("RCP_DEMO"), "hello world");
     EXPECT_EQ(listTree(ws), (std::vector<std::string>{".config/", ".config/config.ini", ".config/org.eclipse.update/",
                                                       ".config/org.eclipse.update/platform.xml", ".config/rcpinstall.properties",
                                                       ".rcp.lock", "logs/", "logs/rcplauncher.log"}));
@@ -151,10 +150,9 @@ TEST(CommandLine, MultiUserServiceStart) {
     const size_t logged = r.log.find(parameters + "RLNCH0133I: ===== End Parameters =====\n");
     EXPECT_NE(logged, std::string::npos) << r.log;
     EXPECT_LT(r.log.find("RLNCH0043I: UserName: muservice\n"), logged);
-    EXPECT_FALSE(r.tmpLogWritten);
     EXPECT_EQ(r.terminal, "");
 
-    // The sandbox root lies fewer than six levels below "/".
+    // A launcher in the sandbox root, fewer than six levels below "/": too shallow.
     o.program = sb.path("rcplauncher");
     sb.installLauncher(o.program);
     r = sb.run(o);
