@@ -221,6 +221,7 @@ void createMUServiceWkspc(wstring& workspaceLocation, const wstring& installDir,
 void getUserCmdString(const wstring& workspaceLocation, int argc, wchar_t** argv, wstring installDir,
                       std::vector<String>& rcpInstallPropertiesArray, std::vector<String>& rcpLauncherPropertiesArray,
                       bool provisioning, bool bRelaunch);
+// "-initMUService": the service's own area, log and lock, then its command line.
 void startupMUService(int argc, wchar_t** argv);
 
 #endif  // RCP_LAUNCHER_H

@@ -26,8 +26,8 @@ bool addConfigExtentionsToArg(int* cargc, wchar_t*** cargv, int argc, wchar_t** 
     // cargv will point into newargs, so it must hold exactly this call's list.
     newargs.clear();
     int vmargsIDX = -1;
-    // Whether the arguments hold "-vmargs" at all: vmargsIDX can be -1 (or
-    // less) for a "-vmargs" near the start, so it cannot tell.
+    // Whether the arguments hold "-vmargs" at all: vmargsIDX can be -1 for a
+    // "-vmargs" near the start, so it cannot tell.
     bool vmargsInArgv = false;
     for (int i = 0; i < argc; ++i) {
         if (i == configOptionIDX || i == configOptionIDX + 1) continue;
@@ -53,9 +53,12 @@ bool addConfigExtentionsToArg(int* cargc, wchar_t*** cargv, int argc, wchar_t** 
         } else if (wcscmp(configExt, VMARGS) == 0) {
             bvmargsFound = true;  // what follows belongs after the own VM arguments
         } else if (!bvmargsFound) {
-            // Before the command line's own "-vmargs". An insertion point that
-            // came out before the start cannot be used as it is.
-            size_t at = vmargsIDX < 0 ? 0 : static_cast<size_t>(vmargsIDX);
+            // Before the command line's own "-vmargs". With "-vmargs" ahead of
+            // "-config" the point comes out too early, even before the program
+            // (element 0); inserted there, the extension would become the
+            // program and the launcher's own path a platform argument. So the
+            // earliest place is right after the program.
+            size_t at = vmargsIDX < 1 ? 1 : static_cast<size_t>(vmargsIDX);
             if (at > newargs.size()) at = newargs.size();
             newargs.insert(newargs.begin() + static_cast<std::ptrdiff_t>(at), configExt);
             vmargsIDX = static_cast<int>(at) + 1;

@@ -1,6 +1,7 @@
 // The multi-user service's own area inside the installation, and the
 // assembly of the child's command line in the order that the configuration
 // (or a provisioning launch) requires.
+#include <cstdlib>
 #include <cwchar>
 #include <string>
 #include <vector>
@@ -9,29 +10,25 @@
 
 namespace {
 
-void makeServiceDirectory(const wstring& dir) {
-    if (isDirectory(dir.c_str())) return;
-    if (!mkdirs(dir.c_str()) && !isDirectory(dir.c_str()))
-        fatalErrorA("RLNCH0010E: Unable to create %ls directory.", dir.c_str(), true);
-}
-
 // A new provisioning level invalidates the JVM's shared class cache. A failed
-// clean-up is reported but does not stop the launch.
+// clean-up is reported, as one error block with the list inside, but does not
+// stop the launch.
 void cleanSharedClasses(std::vector<String>& rcpInstallPropertiesArray,
                         std::vector<String>& rcpLauncherPropertiesArray) {
     if (!isNewProvisioningLevel(findProperty(PROV_MANIFEST_VERSION, rcpInstallPropertiesArray),
                                 findProperty(PROV_MANIFEST_VERSION, rcpLauncherPropertiesArray)))
         return;
     String sharedClasses = findProperty(SHARECLASSES_PROPERTY, rcpInstallPropertiesArray);
+    // An empty value names no directory: there is nothing to empty, and
+    // nothing worth an error block either.
     if (sharedClasses == nullptr || sharedClasses[0] == L'\0') return;
     wstring errlist;
-    if (!removeDirectoryContents(wstring(sharedClasses), errlist)) {
-        fatalErrorA("\nRLNCH0086E begin: Error removing shared classes directory\n%ls\n", errlist.c_str(), false);
+    if (!removeDirectoryContents(wstring(sharedClasses), errlist))
         fatalErrorA(
+            "\nRLNCH0086E begin: Error removing shared classes directory\n%ls\n"
             "RLNCH0087E end: Unable to remove all files in the shared classes directory. Please correct the "
             "problems listed above",
-            false);
-    }
+            errlist.c_str(), false);
 }
 
 }  // namespace
@@ -55,8 +52,8 @@ void createMUServiceWkspc(wstring& workspaceLocation, const wstring& installDir,
     replaceFirstRcpHome(baseLocation, installDir);
     workspaceLocation = installDir + MUSVC_WORKSPACE_LOC;
     wstring configLocation = installDir + MUSVC_CONFIG_LOC;
-    makeServiceDirectory(workspaceLocation);
-    makeServiceDirectory(configLocation);
+    ensureDirectory(workspaceLocation);
+    ensureDirectory(configLocation);
 
     createConfigIni(configLocation, baseLocation);
     wstring propsFile =
@@ -123,6 +120,21 @@ void getUserCmdString(const wstring& workspaceLocation, int argc, wchar_t** argv
     addEnvJavaHighZipfds(rcpInstallPropertiesArray);
 }
 
+// The service start ("-initMUService"), in place of the ordinary startup:
+//  - the service directory (two levels above the launcher's) holds the
+//    launcher properties in "rcp/rcplauncher.properties"; the installation
+//    directory (six levels above) is the one whose "eclipse/.muservice" area
+//    is prepared and which "${rcp.home}" names;
+//  - SetInstallConfiguration gets those launcher properties, as in the
+//    ordinary startup: the installation properties are only made from them
+//    later, and the configuration becomes multiuser_service whatever the file
+//    says;
+//  - the log opens in the service workspace's "logs" directory, where an
+//    administrator finds what the start did, and the platform lock is taken
+//    in that workspace, so that two service starts are serialised like two
+//    launches of one user and launchEclipse records the child as always.
+// No startup record, no provisioning check, no "-config" extensions and no
+// reset: the service area is prepared, not a user's.
 void startupMUService(int argc, wchar_t** argv) {
     wstring serviceDir;
     wstring installDir;
@@ -135,7 +147,17 @@ void startupMUService(int argc, wchar_t** argv) {
     SetInstallConfiguration(rcpLauncherPropertiesArray, true);
     getInstallID(launcherPropsFile, rcpLauncherPropertiesArray);
 
-    wstring workspaceLocation;
+    wstring workspaceLocation = installDir + MUSVC_WORKSPACE_LOC;
+    ensureDirectory(workspaceLocation);
+    wstring logLocation;
+    getLogLocation(logLocation, workspaceLocation);
+    ensureDirectory(logLocation);
+    if (!enableLogging(logLocation)) {
+        dumpLogToTempLocation();
+        exit(255);
+    }
+    locateLockFile(argc, argv, workspaceLocation);
+
     createMUServiceWkspc(workspaceLocation, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc,
                          argv);
     getUserCmdString(workspaceLocation, argc, argv, installDir, rcpInstallPropertiesArray,

@@ -15,8 +15,12 @@ constexpr size_t INITIAL_COMPLETE_FLAG_LEN = 20;
 
 }  // namespace
 
+// A level never recorded is new, whatever the installation ships. An
+// installation that ships no level has nothing new to provision: counting that
+// as new would provision (and empty the shared classes) at every launch.
 bool isNewProvisioningLevel(const wchar_t* previous, const wchar_t* current) {
-    if (previous == nullptr || current == nullptr) return true;
+    if (previous == nullptr) return true;
+    if (current == nullptr) return false;
     return wcscmp(previous, current) != 0;
 }
 

@@ -105,7 +105,12 @@ int launcherMain(int argc, char** argv) {
     doVersionCheck(argc, wargv.data());
     setDebug(isDebug(argc, wargv.data()));
 
-    startup(argc, wargv.data(), launchArgs);
+    // "-initMUService" starts the multi-user service from its own area
+    // instead of a user's platform; the child is started the same way.
+    if (isInitMUService(argc, wargv.data()))
+        startupMUService(argc, wargv.data());
+    else
+        startup(argc, wargv.data(), launchArgs);
 
     // The JVM option that must come after everything startup put in.
     addArgToCommandLine(_JVMARG_XstartOnFirstThread, false);

@@ -1,7 +1,8 @@
 // The exact command line and environment that the child receives, for every
-// install configuration that a launch can be in, and how the effective
-// arguments ('-config NAME' extensions, "-debug", "-console", "-restart",
-// "-rcpLauncherWait") shape the child and the launcher's own behaviour.
+// install configuration that a launch can be in (the multi-user service's
+// own start included), and how the effective arguments ('-config NAME'
+// extensions, "-debug", "-console", "-restart", "-rcpLauncherWait") shape the
+// child and the launcher's own behaviour.
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <unistd.h>
@@ -51,7 +52,8 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         "library.path.append=/opt/append/lib\n"
         "env.setXRCP_COUNTED=yes\n"
         "env.JAVA_HIGH_ZIPFDS=900\n"
-        "library.preload=/nonexistent/libpre.so\n";
+        "library.preload=/nonexistent/libpre.so\n"
+        "jvm.shareclasses.fullpath=\n";  // names no directory: nothing to empty, nothing to report
     for (const std::string configuration : {"user", "lockdown", "serial.multiuser", "multiuser", "userpb", "service"}) {
         SCOPED_TRACE("install.configuration=" + configuration);
         const bool isService = configuration == "service";
@@ -107,8 +109,58 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         env["LD_PRELOAD"] = "/nonexistent/libpre.so";
         EXPECT_EQ(r.child().env, env);
         EXPECT_EQ(withoutLoaderWarnings(r.terminal), "");
+        EXPECT_EQ(logLines(r.log), std::vector<std::string>()) << r.log;
         EXPECT_EQ(readText(r.workspace + "/.rcp.lock"), std::to_string(r.child().pid) + std::string(10, ' '));
     }
+}
+
+// "-initMUService" from a launcher six levels below the installation, whose
+// service directory two levels up holds the launcher properties: the JVM is
+// started from the service's own area, which the start prepares, logs to and
+// locks. A launcher in a shallower tree ends with RLNCH0048E.
+TEST(CommandLine, MultiUserServiceStart) {
+    Sandbox sb;
+    sb.setupInstall("user");  // the installation's own launcher properties are not the service's
+    const std::string svc = sb.inst() + "/p1/p2/p3/p4", ws = sb.inst() + "/eclipse/.muservice";
+    sb.writeFile(svc + "/rcp/rcplauncher.properties", "rcp.install.id=SVC7\nrcp.base.location=${rcp.home}/base\n"
+                                                      "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=multiuser\n");
+    RunOptions o;
+    o.program = svc + "/p5/p6/rcplauncher";
+    sb.installLauncher(o.program);
+    o.args = {"-foo", "-initMUService", "-debug"};
+    LaunchResult r = sb.run(o);
+    ASSERT_EQ(r.status, 0) << r.describe();
+    ASSERT_EQ(r.children.size(), 1u);
+    const std::vector<std::string> argv = {
+        sb.jvm(), "-Dvmarg.one=1", "-Drcp.home=" + sb.inst(), "-Drcp.data=" + ws, "-Dcom.kel.rcp.install.id=SVC7",
+        "-Drcp.install.config=multiuser", "-Dbase.prop=one", "-Drcp.osgi.install.area=" + sb.inst() + "/eclipse",
+        "-Xmx256m", "-cp", sb.base() + "/startup.jar", "org.eclipse.core.launcher.Main", "-nosplash", "-foo",
+        "-initMUService", "-debug", "-data", ws, "-configuration", ws + "/.config", "-application", "com.kel.demo.app",
+        "-XstartOnFirstThread"};
+    EXPECT_EQ(r.child().argv, argv);
+    EXPECT_EQ(listTree(ws), (std::vector<std::string>{".config/", ".config/config.ini", ".config/org.eclipse.update/",
+                                                      ".config/org.eclipse.update/platform.xml", ".config/rcpinstall.properties",
+                                                      ".rcp.lock", "logs/", "logs/rcplauncher.log"}));
+    EXPECT_NE(readText(ws + "/.config/rcpinstall.properties").find("\nrcp.install.id=SVC7\nvm=${rcp.home}/jre/bin/java\n"),
+              std::string::npos);
+    EXPECT_EQ(readText(ws + "/.rcp.lock"), std::to_string(r.child().pid) + std::string(10, ' '));
+    // The whole start is in the service's own log: its user, then the child's command line.
+    std::string parameters = "RLNCH0132I: ===== Begin Parameters =====\n";
+    for (const std::string& a : argv) parameters += a + "\n";
+    const size_t logged = r.log.find(parameters + "RLNCH0133I: ===== End Parameters =====\n");
+    EXPECT_NE(logged, std::string::npos) << r.log;
+    EXPECT_LT(r.log.find("RLNCH0043I: UserName: muservice\n"), logged);
+    EXPECT_EQ(r.terminal, "");
+
+    // A launcher in the sandbox root, fewer than six levels below "/": too shallow.
+    o.program = sb.path("rcplauncher");
+    sb.installLauncher(o.program);
+    r = sb.run(o);
+    EXPECT_EQ(r.status, 255);
+    EXPECT_FALSE(r.hasChild());
+    const std::vector<std::string> tmpLog = logLines(r.tmpLog);
+    EXPECT_TRUE(!tmpLog.empty() && isErrorLine(tmpLog.back(), "RLNCH0048E: Unable to locate the directory containing " +
+                                                                  o.program)) << r.describe();
 }
 
 // The arguments from first (exclusive; "" = the program) up to last.

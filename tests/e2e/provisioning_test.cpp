@@ -1,11 +1,14 @@
 // Provisioning launches: a user's first launch, a new manifest level and the
 // installer's request each run the provisioning child in its own command-line
 // order, wait for it, release the lock and exit without starting the
-// platform; an unchanged level starts the platform as usual, and so does a
-// launcher that finds a platform running.
+// platform; an unchanged level (or none shipped) starts the platform as
+// usual, and so does a launcher that finds a platform running.
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
 
 #include "sandbox.h"
 #include "test_util.h"
@@ -76,17 +79,21 @@ TEST(Provisioning, LaunchSequence) {
         EXPECT_NE(first.log.find("RLNCH0129I: ===== Begin Provisioning Parameters ====="), std::string::npos);
         EXPECT_EQ(first.terminal, "");
 
-        // The provisioned level recorded in the user's properties: the
+        // The provisioned level recorded in the user's properties, and the
+        // installation ships no level or the same one: nothing new, so the
         // platform itself starts, and the shared classes stay.
         sb.writeFile(userProps, readText(userProps) + "provisioning.manifest.version=2\n");
-        sb.writeFile(shared + "/cache.bin", "x");
-        LaunchResult normal = sb.run({"-foo"});
-        ASSERT_EQ(normal.status, 0) << normal.describe();
-        ASSERT_EQ(normal.children.size(), 1u);
-        EXPECT_EQ(normal.child().argIndex("com.kel.provision"), -1);
-        EXPECT_EQ(normal.child().argv.back(), "-XstartOnFirstThread");
-        EXPECT_EQ(readText(lock), std::to_string(normal.child().pid) + std::string(10, ' '));
-        EXPECT_TRUE(pathExists(shared + "/cache.bin"));
+        for (const std::string shipped : {"", "provisioning.manifest.version=2\n"}) {
+            sb.writeLauncherProperties(Sandbox::standardLauncherProperties(configuration) + "provisioning=true\n" + shipped);
+            sb.writeFile(shared + "/cache.bin", "x");
+            LaunchResult normal = sb.run({"-foo"});
+            ASSERT_EQ(normal.status, 0) << normal.describe();
+            ASSERT_EQ(normal.children.size(), 1u);
+            EXPECT_EQ(normal.child().argIndex("com.kel.provision"), -1);
+            EXPECT_EQ(normal.child().argv.back(), "-XstartOnFirstThread");
+            EXPECT_EQ(readText(lock), std::to_string(normal.child().pid) + std::string(10, ' '));
+            EXPECT_TRUE(pathExists(shared + "/cache.bin")) << shipped;
+        }
 
         // The installer asks: provisioning at the same level, without
         // "-userProvLaunch", its options passed on to the platform.
@@ -100,13 +107,21 @@ TEST(Provisioning, LaunchSequence) {
 
         // Only "true" exactly enables provisioning, whatever the level says;
         // a new level still clears the shared classes of the normal launch.
+        // What cannot be removed (a dangling link cannot even be examined) is
+        // listed inside one error block, and the launch goes on.
         sb.writeLauncherProperties(Sandbox::standardLauncherProperties(configuration) +
                                    "provisioning=TRUE\nprovisioning.manifest.version=3\n");
+        ASSERT_EQ(symlink("/nonexistent", (shared + "/dangling").c_str()), 0);
         LaunchResult disabled = sb.run({"-rcpLauncherWait", "-provManifest", "m.xml"});
         ASSERT_EQ(disabled.status, 0) << disabled.describe();
         EXPECT_EQ(disabled.child().argIndex("com.kel.provision"), -1);
         EXPECT_EQ(disabled.child().argv.back(), "-XstartOnFirstThread");
         EXPECT_FALSE(pathExists(shared + "/cache.bin"));
+        EXPECT_NE(disabled.log.find("\nRLNCH0086E begin: Error removing shared classes directory\nCan't stat " + shared +
+                                    "/dangling  -  Failed with error 2: " + strerror(ENOENT) +
+                                    "\n\nRLNCH0087E end: Unable to remove all files in the shared classes directory. "
+                                    "Please correct the problems listed above : "),
+                  std::string::npos) << disabled.log;
 
         // Only the main launcher provisions: one that finds a platform
         // running (this test process stands for it) starts a normal child

@@ -1,6 +1,6 @@
 // The child's command line and environment where a launch of the built
-// launcher cannot show them: the multi-user service's start, the builders'
-// odd inputs, the library path, the preload link and the fatal inputs.
+// launcher cannot show them: the builders' odd inputs, the library path, the
+// preload link and the fatal inputs.
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -14,48 +14,6 @@ namespace {
 std::string env(const char* name) {
     const char* v = getenv(name);
     return v != nullptr ? v : "<unset>";
-}
-
-// The service is started by a launcher in the service layout: the test
-// program copies itself there, and the copy, finding RCP_SERVICE_PROBE set,
-// starts the service instead of running tests and writes down what it built
-// (one test is selected so that the environment is set up at all).
-class ServiceStartProbe : public ::testing::Environment {
-    void SetUp() override {
-        const char* out = getenv("RCP_SERVICE_PROBE");
-        if (out == nullptr) return;
-        resetState();
-        enableLogging(widen(std::string(out) + ".log"));
-        WArgs args{L"probe", L"-x"};
-        startupMUService(args.argc(), args.argv());
-        std::string text;
-        for (const std::wstring& a : launchArgs) text += narrow(a) + " ";
-        writeText(out, text + "SVC_ENV=" + env("SVC_ENV"));
-        _exit(eConfig == multiuser_service ? 0 : 3);
-    }
-};
-const auto* const serviceProbe = ::testing::AddGlobalTestEnvironment(new ServiceStartProbe);
-
-TEST(CmdlineTest, MultiUserServiceStartsFromItsOwnAreaInTheServiceLayout) {
-    TempDir dir;
-    const std::string inst = std::filesystem::canonical(dir.path()), svc = inst + "/p1/p2/p3/svc", out = dir.sub("out");
-    std::string self;  // the service directory lies two, the installation six levels above the launcher's
-    read_executable_path(self);
-    writeText(svc + "/b1/b2/probe", readText(self), 0755);
-    writeText(svc + "/rcp/rcplauncher.properties", "rcp.install.id=SVC1\nrcp.base.location=${rcp.home}/base\n"
-                                                   "jvm.location=/jvm/java\ninstall.configuration=lockdown\n");
-    writeText(inst + "/base/rcpinstall.properties", "application=svc.app\ncp=/ignored.jar\n-Dsvc=1\nenv.set.SVC_ENV=on\n");
-    writeText(inst + "/base/config.ini", "osgi.bundles=x\n");
-    writeText(inst + "/base/platform.xml", "<config/>\n");
-    const std::string probe = "RCP_SERVICE_PROBE=" + out + " " + svc + "/b1/b2/probe --gtest_filter=*Empty* >/dev/null 2>&1";
-    EXPECT_EQ(system(probe.c_str()), 0) << readText(out + ".log");
-    const std::string ws = inst + "/eclipse/.muservice";
-    EXPECT_EQ(readText(out), "/jvm/java -Drcp.home=" + inst + " -Drcp.data=" + ws + " -Dcom.kel.rcp.install.id=SVC1 "
-                             "-Drcp.install.config=multiuser -Dsvc=1 -Drcp.osgi.install.area=" + inst + "/eclipse -cp " +
-                             inst + "/base/startup.jar org.eclipse.core.launcher.Main -nosplash -x -data " + ws +
-                             " -configuration " + ws + "/.config -application svc.app SVC_ENV=on") << readText(out + ".log");
-    EXPECT_NE(readText(ws + "/.config/rcpinstall.properties").find("vm=/jvm/java\n"), std::string::npos);
-    EXPECT_TRUE(pathExists(ws + "/.config/config.ini") && pathExists(ws + "/.config/org.eclipse.update/platform.xml"));
 }
 
 TEST(CmdlineTest, BuildersTakeOnlyWhatTheirOptionsGive) {

@@ -214,10 +214,10 @@ TEST_F(PropertiesTest, ConfigExtensions) {
          {L"a", L"b", L"-foo", L"-vmargs", L"v", L"-Xmx1g"}},
         {{L"p", L"-config", L"x", L"-vmargs", L"v"}, {L"-a", L"", L"-b"}, {L"p", L"-a", L"-b", L"-vmargs", L"v"}},
         {{L"p", L"-config", L"x", L"b"}, {L"-foo", L"-vmargs", L"-X"}, {L"p", L"b", L"-foo", L"-vmargs", L"-X"}},
-        // "-config" after "-vmargs": the insertion point is two places early, never before the start
+        // "-config" after "-vmargs": the insertion point is two places early, never before the program
         {{L"p", L"a", L"b", L"-vmargs", L"v", L"-config", L"x"}, {L"-foo"}, {L"p", L"-foo", L"a", L"b", L"-vmargs", L"v"}},
-        {{L"p", L"a", L"-vmargs", L"-config", L"x"}, {L"-foo"}, {L"-foo", L"p", L"a", L"-vmargs"}},
-        {{L"p", L"-vmargs", L"-config", L"x"}, {L"-foo"}, {L"-foo", L"p", L"-vmargs"}},
+        {{L"p", L"a", L"-vmargs", L"-config", L"x"}, {L"-foo"}, {L"p", L"-foo", L"a", L"-vmargs"}},
+        {{L"p", L"-vmargs", L"-config", L"x"}, {L"-foo", L"-bar"}, {L"p", L"-foo", L"-bar", L"-vmargs"}},
         // the command line's own "-vmargs" makes the extension's one go
         {{L"p", L"-vmargs", L"v", L"-config", L"x"}, {L"-vmargs", L"-Xmx1g"}, {L"p", L"-vmargs", L"v", L"-Xmx1g"}},
         // a second option word goes, its value stays; "-personality" is removed twice
