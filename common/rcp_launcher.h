@@ -14,6 +14,7 @@
 #define RCP_LAUNCHER_H
 
 #include <cstdio>
+#include <cstdlib>
 #include <string>
 #include <vector>
 
@@ -50,6 +51,11 @@ String freeString(String s);          // frees, returns null
 String initMemString(String str1, const wchar_t* str2);  // wcscat, returns str1
 // A new String holding a copy of text.
 String copyString(const wchar_t* text);
+// dir + "/" + name (just dir when name is empty), in the platform's
+// separators: the one way a path is put together from its parts.
+wstring joinPath(const wstring& dir, const wstring& name);
+// path in the platform's separators.
+wstring nativePath(wstring path);
 
 // ===================== Child command line (rcp_launcher_launch) ==============
 extern std::vector<wstring> launchArgs;
@@ -83,8 +89,16 @@ bool isLockdownConfig();
 
 // ===================== Startup sequence (rcp_launcher_startup) ===============
 void startup(int argc, wchar_t** argv, const std::vector<wstring>& launchArgs);
-// isDirectory, else set userFirstLaunch and mkdirs; RLNCH0010E when that fails.
+// isDirectory, else set userFirstLaunch and mkdirs; RLNCH0010E when that
+// fails. The one way a directory is made: a directory that another launcher
+// made meanwhile counts as made.
 void ensureDirectory(const wstring& dir);
+// <workspace>/logs.
+void getLogLocation(wstring& logLocation, const wstring& workspaceLocation);
+// The workspace and its log directory ensured, the log opened there (else
+// the queue goes to /tmp/rcplauncher.log and the launch ends with 255), and
+// the platform lock taken in the workspace.
+void openWorkspace(const wstring& workspaceLocation, int argc, wchar_t** argv);
 
 // ===================== Platform lock file, protocol (rcp_launcher_lock) ======
 void locateLockFile(int argc, wchar_t** argv, const wstring& workspace);
@@ -96,6 +110,15 @@ void getProperties(const wstring& propFilePath, std::vector<String>& propArray);
 String findProperty(const wchar_t* name, const std::vector<String>& propArray);
 // Borrowed key/value pointers, closed by an entry pointing to "". free() it.
 String* findProperties(const wchar_t* prefix, const std::vector<String>& propArray);
+// Calls fn(key, value) for every pair whose key begins with prefix, in file
+// order, while fn returns true: the one walk over a findProperties result.
+template <typename Fn>
+void forEachProperty(const wchar_t* prefix, const std::vector<String>& props, Fn fn) {
+    String* found = findProperties(prefix, props);
+    for (size_t i = 0; found[i][0] != L'\0'; i += 2)
+        if (!fn(found[i], found[i + 1])) break;
+    free(found);
+}
 // Removes the second occurrence of str (only that one element), if any.
 void removeDuplicates(std::vector<wstring>& args, const wchar_t* str);
 void FilterProp(wstring& key);

@@ -35,8 +35,7 @@ String getInstallID(wstring rcp_launcher_properties_file, std::vector<String>& r
     if (installID != nullptr) return installID;
 
     if (eConfig != userpb) {
-        fatalErrorA("RLNCH0016E: rcp.install.id is required for this configuration!", true);
-        return nullptr;
+        fatalErrorExit("RLNCH0016E: rcp.install.id is required for this configuration!");
     }
 
     // A package-builder installation names itself on its first launch; the
@@ -54,9 +53,7 @@ String getInstallID(wstring rcp_launcher_properties_file, std::vector<String>& r
     FILE* fp = nullptr;
     open_wfile(fp, rcp_launcher_properties_file.c_str(), L"a+");
     if (fp == nullptr) {
-        fatalErrorA("RLNCH0017E: Could not open %ls to append rcp.install.id!", rcp_launcher_properties_file.c_str(),
-                    true);
-        return installID;
+        fatalErrorExit("RLNCH0017E: Could not open %ls to append rcp.install.id!", rcp_launcher_properties_file.c_str());
     }
     const wstring line = wstring(RCP_INSTALL_ID_PROPERTY) + EQUALS_CHAR + installID + NEWLINE;
     // The line is formatted as a text without arguments, never handed to
@@ -64,7 +61,7 @@ String getInstallID(wstring rcp_launcher_properties_file, std::vector<String>& r
     const bool written = fputws(formatWithoutArgs(line).c_str(), fp) >= 0 && fflush(fp) == 0;
     fclose(fp);
     if (!written) {
-        fatalErrorA("RLNCH0018E: Error while writing to %ls file.", rcp_launcher_properties_file.c_str(), true);
+        fatalErrorExit("RLNCH0018E: Error while writing to %ls file.", rcp_launcher_properties_file.c_str());
     }
     return installID;
 }
@@ -92,8 +89,7 @@ int getWorkspaceLocation(wstring& workspaceLocation, std::vector<String>& rcpIns
     if (rcpData != nullptr) {
         wstring expanded = rcpData;
         if (!replaceUserPlaceholders(expanded, rcpInstallPropertiesArray)) {
-            fatalErrorA("RLNCH0099E: rcp.data property is invalid (%ls)", expanded.c_str(), true);
-            return 0;
+            fatalErrorExit("RLNCH0099E: rcp.data property is invalid (%ls)", expanded.c_str());
         }
         removeOneTrailingSeparator(expanded);
         workspaceLocation = expanded;
@@ -102,13 +98,11 @@ int getWorkspaceLocation(wstring& workspaceLocation, std::vector<String>& rcpIns
 
     String installID = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
     if (installID == nullptr) {
-        fatalErrorA("RLNCH0005E: Couldn't find the rcp.install.id property!", true);
-        return 0;
+        fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
     }
     wstring userName;
     if (getEnv(USER_IN_ENV, userName) == nullptr) {
-        fatalErrorA("RLNCH0006E: Couldn't find the user name!", true);
-        return 0;
+        fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
     }
     wstring home;
     getUserHome(home);
@@ -135,8 +129,7 @@ int getConfigurationLocation(wstring& configLocation, std::vector<String>& rcpIn
 }
 
 bool isOldRcpInstallId(const wstring& launcherInstallID, const wstring& configLocation) {
-    wstring propsPath = configLocation + L"/" + INSTALL_PROPS;
-    convertToOsSeparator(propsPath);
+    const wstring propsPath = joinPath(configLocation, INSTALL_PROPS);
     if (!exists(propsPath.c_str())) return false;
 
     std::vector<String> props;

@@ -32,9 +32,7 @@ bool swapExecutableName(const wstring& vmString, const wchar_t* from, const wcha
 wstring requireBaseLocation(const std::vector<String>& props) {
     String baseLoc = findProperty(RCP_BASE_LOC_PROPERTY, props);
     if (baseLoc == nullptr) {
-        fatalErrorA("RLNCH0011E: Unable to determine RCP Base Plugin location. If the problem persists, reinstall.",
-                    true);
-        return wstring();
+        fatalErrorExit("RLNCH0011E: Unable to determine RCP Base Plugin location. If the problem persists, reinstall.");
     }
     return wstring(baseLoc);
 }
@@ -58,8 +56,7 @@ void addVmToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
     } else {
         String vm = findProperty(VM, rcpInstallPropertiesArray);
         if (vm == nullptr) {
-            fatalErrorA("RLNCH0002E: vm string must be specified!", true);
-            return;
+            fatalErrorExit("RLNCH0002E: vm string must be specified!");
         }
         vmString = vm;
     }
@@ -89,8 +86,7 @@ bool isJavaw(wstring& vmString, const wchar_t* javawDEF, const wchar_t* javaDEF)
         vmString = swapped;
         return true;
     }
-    fatalErrorA("RLNCH0003E: Specified vm (%ls) does not exist!", swapped.c_str(), true);
-    return false;
+    fatalErrorExit("RLNCH0003E: Specified vm (%ls) does not exist!", swapped.c_str());
 }
 
 bool replaceJavaExecutableName(wstring& vmString, const wchar_t* origName, const wchar_t* replacementName) {
@@ -104,8 +100,7 @@ bool replaceJavaExecutableName(wstring& vmString, const wchar_t* origName, const
 void addBaseEclipseToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
     wstring baseLocEclipse = requireBaseLocation(rcpInstallPropertiesArray) + BASE_ECLIPSE_PATH;
     if (isExecutable(baseLocEclipse.c_str()) != 1) {
-        fatalErrorA("RLNCH0007E: %ls is not executable or does not exist.", baseLocEclipse.c_str(), true);
-        return;
+        fatalErrorExit("RLNCH0007E: %ls is not executable or does not exist.", baseLocEclipse.c_str());
     }
     addPathToCommandLine(baseLocEclipse);
 }

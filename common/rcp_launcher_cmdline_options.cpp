@@ -58,8 +58,7 @@ void addMainOptionsToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
     }
 
     if (findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray) == nullptr) {
-        fatalErrorA("RLNCH0005E: Couldn't find the rcp.install.id property!", true);
-        return;
+        fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
     }
 
     wstring location;

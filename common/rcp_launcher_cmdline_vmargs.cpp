@@ -10,19 +10,6 @@
 
 namespace {
 
-// Walks a findProperties result (key, value, key, value, ..., "") and releases
-// the array, which only borrows the strings, at the end.
-template <typename Fn>
-void forEachProperty(const wchar_t* prefix, const std::vector<String>& props, Fn fn) {
-    String* found = findProperties(prefix, props);
-    if (found == nullptr) return;
-    for (size_t i = 0; found[i] != nullptr && found[i][0] != L'\0'; i += 2) {
-        const wchar_t* value = found[i + 1] != nullptr ? found[i + 1] : L"";
-        if (!fn(found[i], value)) break;
-    }
-    free(found);
-}
-
 const wchar_t* configurationName() {
     switch (eConfig) {
         case service:
@@ -75,8 +62,7 @@ void addVmargsToCommandLine(const wstring& workspaceLocation, std::vector<String
             wstring vmfix(value);
             size_t pos = vmfix.find(WORKSPACELOCATION_REPLACE);
             if (pos != wstring::npos) vmfix.replace(pos, wcslen(WORKSPACELOCATION_REPLACE), workspaceLocation);
-            convertToOsSeparator(vmfix);
-            addArgToCommandLine(vmfix);
+            addArgToCommandLine(nativePath(vmfix));
             return false;  // the first entry only
         });
     }
@@ -109,16 +95,14 @@ void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
 
     String IDString = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
     if (IDString == nullptr) {
-        fatalErrorA("RLNCH0005E: Couldn't find the rcp.install.id property!", true);
-        return;
+        fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
     }
     setArgProperty(commandArg, D_RCP_INSTALL_ID_PROP, IDString);
     addArgToCommandLine(commandArg);
 
     const wchar_t* configName = configurationName();
     if (configName == nullptr) {
-        fatalErrorA("RLNCH0025E: The platform rcp.install.id must be provided for this configuration!", true);
-        return;
+        fatalErrorExit("RLNCH0025E: The platform rcp.install.id must be provided for this configuration!");
     }
     setArgProperty(commandArg, D_CONFIG, configName);
     addArgToCommandLine(commandArg);
@@ -131,12 +115,8 @@ void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
         return true;
     });
 
-    wstring installArea = installDir + INSTALL_AREA_DIR;
-    convertToOsSeparator(installArea);
-    if (!exists(installArea.c_str())) {
-        installArea = installDir + INSTALL_AREA_FALLBACK_DIR;
-        convertToOsSeparator(installArea);
-    }
+    wstring installArea = nativePath(installDir + INSTALL_AREA_DIR);
+    if (!exists(installArea.c_str())) installArea = nativePath(installDir + INSTALL_AREA_FALLBACK_DIR);
     setArgProperty(commandArg, D_OSGI_INSTALL_AREA, installArea.c_str());
     addArgToCommandLine(commandArg);
 }

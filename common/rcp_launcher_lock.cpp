@@ -42,14 +42,12 @@ bool checkLockFile()
     if (result == 1) {
         return isProcessAlive(pid);
     }
-    fatalErrorA("RLNCH0092E: Error reading platform lock file.", true);
-    return false;
+    fatalErrorExit("RLNCH0092E: Error reading platform lock file.");
 }
 
 void locateLockFile(int argc, wchar_t** argv, const wstring& workspace)
 {
-    lockFilePath = workspace + L"/" + RCP_LOCK_FILE;
-    convertToOsSeparator(lockFilePath);
+    lockFilePath = joinPath(workspace, RCP_LOCK_FILE);
     createAndOpenLockFile();
 
     if (isRestart(argc, argv)) {
@@ -76,7 +74,5 @@ void locateLockFile(int argc, wchar_t** argv, const wstring& workspace)
         }
     }
 
-    wstring sid = workspace + L"/" + SID_FILE;
-    convertToOsSeparator(sid);
-    lockLockFile(sid);
+    lockLockFile(joinPath(workspace, SID_FILE));
 }

@@ -40,8 +40,7 @@ void createMUServiceWkspc(wstring& workspaceLocation, const wstring& installDir,
     if (eConfig == multiuser_service) {
         userName = MUSERVICE_USER;
     } else if (getEnv(USER_IN_ENV, userName) == nullptr) {
-        fatalErrorA("RLNCH0006E: Couldn't find the user name!", true);
-        return;
+        fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
     }
     SvcDebugOutW(L"RLNCH0043I: UserName: %s", userName.c_str());
 
@@ -148,15 +147,7 @@ void startupMUService(int argc, wchar_t** argv) {
     getInstallID(launcherPropsFile, rcpLauncherPropertiesArray);
 
     wstring workspaceLocation = installDir + MUSVC_WORKSPACE_LOC;
-    ensureDirectory(workspaceLocation);
-    wstring logLocation;
-    getLogLocation(logLocation, workspaceLocation);
-    ensureDirectory(logLocation);
-    if (!enableLogging(logLocation)) {
-        dumpLogToTempLocation();
-        exit(255);
-    }
-    locateLockFile(argc, argv, workspaceLocation);
+    openWorkspace(workspaceLocation, argc, argv);
 
     createMUServiceWkspc(workspaceLocation, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc,
                          argv);

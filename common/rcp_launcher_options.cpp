@@ -34,7 +34,7 @@ bool isISMPProvisioning(int argc, wchar_t** argv) {
 bool isInitMUService(int argc, wchar_t** argv) { return findOption(INITMUSERVICEARG, argc, argv) != -1; }
 
 void doVersionCheck(int argc, wchar_t** argv) {
-    if (findOption(VERSIONARG, argc, argv) != -1) fatalErrorA("RLNCH0031I:   version = \"%ls\"", BUILDDATE, true);
+    if (findOption(VERSIONARG, argc, argv) != -1) fatalErrorExit("RLNCH0031I:   version = \"%ls\"", BUILDDATE);
 }
 
 void getCmdString(int /*argc*/, wchar_t** /*argv*/) {}

@@ -51,6 +51,13 @@ void fatalErrorA(const char* msg, bool bExit);
 void fatalErrorA(const char* msg, const char* arg, bool bExit);
 void fatalErrorA(const char* msg, const wchar_t* arg, bool bExit);  // arg for "%ls"
 void fatalErrorW(const wchar_t* mgs, bool bExit);
+// The end of a launch that cannot go on: fatalErrorA with the exit flag, the
+// one way the launcher's own code ends on an error (status 255).
+[[noreturn]] void fatalErrorExit(const char* msg);
+[[noreturn]] void fatalErrorExit(const char* msg, const wchar_t* arg);  // arg for "%ls"
+// Ends the process with status (after a provisioning child, or a log that
+// could not be opened anywhere).
+[[noreturn]] void exitLauncher(int status);
 
 // Scratch buffer for callers that pre-format a message carrying a number.
 inline constexpr size_t TEMP_OUT_BUFFER_SIZE = 1024;

@@ -80,7 +80,7 @@ void appendForLog(wstring& log, const wstring& text) {
 // can be megabytes long; the line names its beginning.
 void substitutionInvalid(wstring text) {
     if (text.length() > QUOTED_VALUE_LIMIT) text = text.substr(0, QUOTED_VALUE_LIMIT) + L"...";
-    fatalErrorA("RLNCH0088E: property substitution is invalid (%ls)", text.c_str(), true);
+    fatalErrorExit("RLNCH0088E: property substitution is invalid (%ls)", text.c_str());
 }
 
 }  // namespace

@@ -131,8 +131,7 @@ void getProperties(const wstring& propFilePath, std::vector<String>& propArray) 
     FILE* fp = nullptr;
     open_file(fp, propFilePath.c_str(), L"r");
     if (fp == nullptr) {
-        fatalErrorA("RLNCH0014E: Unable to load %ls file!", propFilePath.c_str(), true);
-        return;
+        fatalErrorExit("RLNCH0014E: Unable to load %ls file!", propFilePath.c_str());
     }
     fseek(fp, 0, SEEK_SET);
 
@@ -220,8 +219,7 @@ String* findProperties(const wchar_t* prefix, const std::vector<String>& propArr
     size_t capacity = 10;
     String* result = static_cast<String*>(malloc((capacity + 1) * sizeof(String)));
     if (result == nullptr) {
-        fatalErrorA("RLNCH0046E: findProperties malloc for property strings failed!", true);
-        return nullptr;
+        fatalErrorExit("RLNCH0046E: findProperties malloc for property strings failed!");
     }
     const size_t prefixLen = prefix ? wcslen(prefix) : 0;
     size_t count = 0;
@@ -235,8 +233,7 @@ String* findProperties(const wchar_t* prefix, const std::vector<String>& propArr
             String* grown = static_cast<String*>(realloc(result, (capacity + 1) * sizeof(String)));
             if (grown == nullptr) {
                 free(result);
-                fatalErrorA("RLNCH0046E: findProperties malloc for property strings failed!", true);
-                return nullptr;
+                fatalErrorExit("RLNCH0046E: findProperties malloc for property strings failed!");
             }
             result = grown;
         }

@@ -1,6 +1,7 @@
 // Deciding whether a launch must first run a provisioning pass (a new level of
 // the provisioning manifest, a user's first launch, an installer's request)
 // or an initial configuration of the platform, and running the former.
+#include <algorithm>
 #include <cstdlib>
 #include <cwchar>
 #include <string>
@@ -28,53 +29,35 @@ bool isInitialRequired(std::vector<String> rcpLauncherPropertiesArray,
                        std::vector<String> rcpInstallPropertiesArray) {
     if (eConfig != user && eConfig != userpb && eConfig != multiuser) return false;
 
-    String* config_initial = findProperties(CONFIG_INITIAL_PREFIX, rcpLauncherPropertiesArray);
-    if (config_initial == nullptr) return false;
-    size_t size = 0;
-    while (config_initial[size] != nullptr && config_initial[size][0] != L'\0') size += 2;
-    if (size == 0) {
-        free(config_initial);
-        return false;
-    }
+    std::vector<std::pair<const wchar_t*, const wchar_t*>> initial;
+    forEachProperty(CONFIG_INITIAL_PREFIX, rcpLauncherPropertiesArray, [&](const wchar_t* key, const wchar_t* value) {
+        initial.emplace_back(key, value);
+        return true;
+    });
+    if (initial.empty()) return false;
 
-    // The numbered entries in order 1, 2, 3...; a gap is an error. A number
-    // matches as a prefix, so "config.initial.1" also finds "config.initial.10".
-    std::vector<const wchar_t*> config_vector;
-    for (size_t i = 1; i <= size / 2; i++) {
-        wstring configStr = CONFIG_INITIAL_PREFIX + std::to_wstring(i);
-        bool found = false;
-        for (size_t j = 0; j < size; j += 2) {
-            if (wcsncmp(config_initial[j], configStr.c_str(), configStr.size()) == 0) {
-                config_vector.push_back(config_initial[j]);
-                config_vector.push_back(config_initial[j + 1] != nullptr ? config_initial[j + 1] : L"");
-                found = true;
-                break;
-            }
-        }
-        if (!found) {
-            free(config_initial);
-            fatalErrorA("RLNCH0114E: Invalid config.initial arguments. %ls not found", configStr.c_str(), true);
-            return false;
-        }
+    // The values numbered 1, 2, 3...; a gap is an error. A number matches as
+    // a prefix, so "config.initial.1" also finds "config.initial.10".
+    std::vector<const wchar_t*> values;
+    for (size_t i = 1; i <= initial.size(); i++) {
+        const wstring configStr = CONFIG_INITIAL_PREFIX + std::to_wstring(i);
+        auto match = std::find_if(initial.begin(), initial.end(), [&](const auto& pair) {
+            return wcsncmp(pair.first, configStr.c_str(), configStr.size()) == 0;
+        });
+        if (match == initial.end())
+            fatalErrorExit("RLNCH0114E: Invalid config.initial arguments. %ls not found", configStr.c_str());
+        values.push_back(match->second);
     }
-    free(config_initial);
 
     // "-initialCompleteFlag" is followed by the name of the installation
     // property that records a finished initial launch.
-    size_t flagPos = config_vector.size();
-    for (size_t v = 1; v < config_vector.size(); v += 2) {
-        if (wcsncmp(config_vector[v], INITIALCOMPLETEFLAG, INITIAL_COMPLETE_FLAG_LEN) == 0) {
-            flagPos = v;
-            break;
-        }
-    }
-    if (flagPos + 2 >= config_vector.size()) {
-        fatalErrorA("RLNCH0115E: Invalid config.initial arguments. -initialCompleteFlag not found", true);
-        return false;
-    }
-    const wchar_t* key_name = config_vector[flagPos + 2];
+    auto flag = std::find_if(values.begin(), values.end(), [](const wchar_t* value) {
+        return wcsncmp(value, INITIALCOMPLETEFLAG, INITIAL_COMPLETE_FLAG_LEN) == 0;
+    });
+    if (flag == values.end() || flag + 1 == values.end())
+        fatalErrorExit("RLNCH0115E: Invalid config.initial arguments. -initialCompleteFlag not found");
 
-    String completed = findProperty(key_name, rcpInstallPropertiesArray);
+    String completed = findProperty(*(flag + 1), rcpInstallPropertiesArray);
     return !(completed != nullptr && wcsncmp(completed, TRUE_VALUE, wcslen(TRUE_VALUE)) == 0);
 }
 
@@ -109,5 +92,5 @@ void checkForProvisioning(const wstring& workspaceLocation, int argc, wchar_t** 
 
     // The platform itself is started by the next launch.
     unlockLockFile();
-    exit(0);
+    exitLauncher(0);
 }

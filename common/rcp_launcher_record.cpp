@@ -1,6 +1,5 @@
 // The startup record (args.properties), which lets the platform start the
-// launcher again exactly as it was started, and the log directory of a
-// workspace.
+// launcher again exactly as it was started.
 #include <cwchar>
 #include <string>
 
@@ -21,8 +20,7 @@ constexpr size_t RECORD_COMPARE_LIMIT = 64 * 1024;
 }  // namespace
 
 void writeStartupArgs(int argc, wchar_t** argv, const wstring& configLocation) {
-    wstring tfile = configLocation + L"/" + ARGS_PROPERTIES;
-    convertToOsSeparator(tfile);
+    const wstring tfile = joinPath(configLocation, ARGS_PROPERTIES);
 
     // The platform adds these itself when it restarts the launcher; recording
     // them would make every later start a restart or a reset.
@@ -56,12 +54,7 @@ void writeStartupArgs(int argc, wchar_t** argv, const wstring& configLocation) {
     // a failed write (a full disk) leaves the previous record as it was.
     const wstring work = tfile + WORK_FILE_SUFFIX;
     FILE* fp = createWorkFile(work);
-    if (fp == nullptr) fatalErrorA("RLNCH0019E: Could not open %ls for writing!", tfile.c_str(), true);
+    if (fp == nullptr) fatalErrorExit("RLNCH0019E: Could not open %ls for writing!", tfile.c_str());
     putWide(fp, record);
-    if (!commitWorkFile(fp, work, tfile)) fatalErrorA("RLNCH0020E: Error writing to %ls file.", tfile.c_str(), true);
-}
-
-void getLogLocation(wstring& logLocation, const wstring& workspaceLocation) {
-    logLocation = workspaceLocation + L"/" + LOG_DIR;
-    convertToOsSeparator(logLocation);
+    if (!commitWorkFile(fp, work, tfile)) fatalErrorExit("RLNCH0020E: Error writing to %ls file.", tfile.c_str());
 }

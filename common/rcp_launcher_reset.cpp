@@ -16,22 +16,14 @@ namespace {
 // message, whose "%ls" receives the list.
 void removeTreeOrFail(const wstring& dir, const char* message) {
     wstring errlist;
-    if (!removeDirectoryAndContents(dir, errlist)) fatalErrorA(message, errlist.c_str(), true);
-}
-
-wstring joinPath(const wstring& dir, const wstring& name) {
-    wstring path = dir;
-    if (!name.empty()) path += L"/" + name;
-    convertToOsSeparator(path);
-    return path;
+    if (!removeDirectoryAndContents(dir, errlist)) fatalErrorExit(message, errlist.c_str());
 }
 
 wstring updateDirOf(const wstring& configLocation) { return joinPath(configLocation, UPDATE_DIR); }
 
 // "<area>bak", beside the area (a trailing separator would put it inside).
 wstring backupOf(const wstring& configLocation) {
-    wstring area = configLocation;
-    convertToOsSeparator(area);
+    wstring area = nativePath(configLocation);
     while (area.size() > 1 && area.back() == L'/') area.pop_back();
     return area + BACKUP_SUFFIX;
 }
@@ -53,12 +45,11 @@ bool leavesPluginsDir(const wstring& value) {
 // Moves the area to its backup, begins a new one with its update directory
 // and brings the registry back into it.
 void replaceArea(const wstring& workspaceLocation, const wstring& configLocation) {
-    const wstring area = joinPath(configLocation, L"");
+    const wstring area = nativePath(configLocation);
     const wstring updateDir = updateDirOf(configLocation);
     handleDirMove(backupOf(configLocation), area, true);
     if (!mkdirs(updateDir.c_str())) {
-        fatalErrorA("RLNCH0010E: Unable to create %ls directory.", updateDir.c_str(), true);
-        return;
+        fatalErrorExit("RLNCH0010E: Unable to create %ls directory.", updateDir.c_str());
     }
     handleFileMove(updateDir, REGISTRY_FILE, workspaceLocation, REGISTRY_SAVED, false);
 }
@@ -75,15 +66,13 @@ void handleCopy(const wstring& dstdir, const wstring& dstname, const wstring& sr
             SvcDebugOutW(L"RLNCH0110I: '%s' not found", src.c_str());
             return;
         }
-        fatalErrorA("RLNCH0109E: Unable to locate '%ls' for copying", src.c_str(), true);
-        return;
+        fatalErrorExit("RLNCH0109E: Unable to locate '%ls' for copying", src.c_str());
     }
 
     if (exists(dst.c_str())) {
         if (!isDirectory(dst.c_str())) {
             if (!deleteFile(dst.c_str())) {
-                fatalErrorA("RLNCH0111E: Can't delete old copy of file '%ls'", dst.c_str(), true);
-                return;
+                fatalErrorExit("RLNCH0111E: Can't delete old copy of file '%ls'", dst.c_str());
             }
         } else {
             removeTreeOrFail(dst,
@@ -95,11 +84,11 @@ void handleCopy(const wstring& dstdir, const wstring& dstname, const wstring& sr
 
     if (bRemoveSrc) {
         if (!moveFile(src.c_str(), dst.c_str())) {
-            fatalErrorA("RLNCH0112E: Can't move file/dir  '%ls'", src.c_str(), true);
+            fatalErrorExit("RLNCH0112E: Can't move file/dir  '%ls'", src.c_str());
         }
     } else {
         if (!copyFile(src.c_str(), dst.c_str())) {
-            fatalErrorA("RLNCH0113E: Can't copy file  '%ls'", src.c_str(), true);
+            fatalErrorExit("RLNCH0113E: Can't copy file  '%ls'", src.c_str());
         }
     }
 }
@@ -119,31 +108,28 @@ void resetMetaDataDirs(const wstring& workspaceLocation, const wstring& configLo
     if (!exists(propsPath.c_str())) {
         propsPath = getCoreFileLocation(coreLocation, INSTALL_PROPS);
         if (!exists(propsPath.c_str())) {
-            fatalErrorA("RLNCH0106E: Unable to locate %ls file.", propsPath.c_str(), true);
-            return;
+            fatalErrorExit("RLNCH0106E: Unable to locate %ls file.", propsPath.c_str());
         }
     }
 
     std::vector<String> props;
     getProperties(propsPath, props);
-    String* resetDirs = findProperties(RESET_DIR_PREFIX, props);
 
-    wstring pluginsDir = workspaceLocation + L"/" + METADATA_DIR + L"/" + PLUGINS_DIR + L"/";
-    convertToOsSeparator(pluginsDir);
+    const wstring pluginsDir = joinPath(workspaceLocation, wstring(METADATA_DIR) + L"/" + PLUGINS_DIR);
 
-    // Collect first: a fatal error below must not leave the list half-used.
+    // Collected first, so that the file's strings are released before a
+    // removal can end the launch.
     std::vector<wstring> values;
-    for (size_t i = 0; resetDirs != nullptr && resetDirs[i] != nullptr && resetDirs[i][0] != 0; i += 2) {
-        if (resetDirs[i + 1] != nullptr) values.emplace_back(resetDirs[i + 1]);
-    }
-    free(resetDirs);
+    forEachProperty(RESET_DIR_PREFIX, props, [&](const wchar_t*, const wchar_t* value) {
+        values.emplace_back(value);
+        return true;
+    });
     freeProperties(props);
 
     for (const wstring& value : values) {
         if (leavesPluginsDir(value)) continue;  // passed over like a directory that is not there
         // An empty value names the plug-in state directory itself.
-        wstring dir = pluginsDir + value;
-        convertToOsSeparator(dir);
+        const wstring dir = joinPath(pluginsDir, value);
         if (!exists(dir.c_str())) continue;
         removeTreeOrFail(dir,
                          "\nRLNCH0107E begin: Error removing metadata plugin directory\n%ls\n"

@@ -33,7 +33,23 @@ void ensureDirectory(const wstring& dir) {
     const int mkdirsErrno = errno;
     if (isDirectory(dir.c_str())) return;
     errno = mkdirsErrno;  // the error line reports why mkdirs failed
-    fatalErrorA("RLNCH0010E: Unable to create %ls directory.", dir.c_str(), true);
+    fatalErrorExit("RLNCH0010E: Unable to create %ls directory.", dir.c_str());
+}
+
+void getLogLocation(wstring& logLocation, const wstring& workspaceLocation) {
+    logLocation = joinPath(workspaceLocation, LOG_DIR);
+}
+
+void openWorkspace(const wstring& workspaceLocation, int argc, wchar_t** argv) {
+    ensureDirectory(workspaceLocation);
+    wstring logLocation;
+    getLogLocation(logLocation, workspaceLocation);
+    ensureDirectory(logLocation);
+    if (!enableLogging(logLocation)) {
+        dumpLogToTempLocation();  // RLNCH0019E and what came before it
+        exitLauncher(255);
+    }
+    locateLockFile(argc, argv, workspaceLocation);
 }
 
 namespace {
@@ -55,7 +71,6 @@ struct Startup {
     wstring installID;
     wstring coreLocation;
     wstring workspaceLocation;
-    wstring logLocation;
     wstring configLocation;
 };
 
@@ -91,28 +106,17 @@ void readInstallationIdentity(Startup& s) {
 
     const wchar_t* base = findProperty(RCP_BASE_LOC_PROPERTY, s.rcpLauncherPropertiesArray);
     if (!base)
-        fatalErrorA("RLNCH0050E: rcp.base.location property is missing from %ls",
-                    s.rcp_launcher_properties_file.c_str(), true);
+        fatalErrorExit("RLNCH0050E: rcp.base.location property is missing from %ls",
+                    s.rcp_launcher_properties_file.c_str());
     s.coreLocation = base;
     // Only the first occurrence: later ones are the installer's business.
     replaceFirstRcpHome(s.coreLocation, s.installDir);
 }
 
-// Workspace, log, platform lock, configuration area, in this order: the log
-// opens as soon as its directory exists, and the lock is held from then on.
+// Workspace, log, platform lock, configuration area, in this order.
 void prepareUserAreas(Startup& s) {
     getWorkspaceLocation(s.workspaceLocation, s.rcpLauncherPropertiesArray, s.cargc, s.cargv, s.installDir);
-    ensureDirectory(s.workspaceLocation);
-
-    getLogLocation(s.logLocation, s.workspaceLocation);
-    ensureDirectory(s.logLocation);
-    if (!enableLogging(s.logLocation)) {
-        dumpLogToTempLocation();
-        exit(255);
-    }
-
-    locateLockFile(s.cargc, s.cargv, s.workspaceLocation);
-
+    openWorkspace(s.workspaceLocation, s.cargc, s.cargv);
     getConfigurationLocation(s.configLocation, s.rcpLauncherPropertiesArray, s.cargc, s.cargv, s.installDir);
     ensureDirectory(s.configLocation);
 }
@@ -131,18 +135,11 @@ void reuseOrResetAreas(Startup& s) {
 // The user's own update site, and the installation's shared
 // extension marker copied into it when the installation has one.
 void prepareUserSite(Startup& s) {
-    wstring siteLocation = s.workspaceLocation + SITE_LOC;
-    for (const wchar_t* child : {SITE_FEATURES_DIR, SITE_PLUGINS_DIR}) {
-        wstring siteChildLocation = siteLocation + child;
-        convertToOsSeparator(siteChildLocation);
-        ensureDirectory(siteChildLocation);
-    }
+    const wstring siteLocation = s.workspaceLocation + SITE_LOC;
+    for (const wchar_t* child : {SITE_FEATURES_DIR, SITE_PLUGINS_DIR}) ensureDirectory(nativePath(siteLocation + child));
 
-    siteLocation += ECLIPSE_EXTENSION_FILE;
-    wstring extLocation = s.installDir + SHARED_EXTENSION_LOC;
-    convertToOsSeparator(siteLocation);
-    convertToOsSeparator(extLocation);
-    if (exists(extLocation.c_str())) copyFile(extLocation.c_str(), siteLocation.c_str());
+    const wstring extLocation = nativePath(s.installDir + SHARED_EXTENSION_LOC);
+    if (exists(extLocation.c_str())) copyFile(extLocation.c_str(), nativePath(siteLocation + ECLIPSE_EXTENSION_FILE).c_str());
 }
 
 // The startup record (main process only, with the arguments

@@ -1,5 +1,6 @@
-// Owned wide C strings. An allocation failure cannot be recovered from in a
-// launcher, so it ends the launch through the fatal path.
+// Owned wide C strings, and paths joined from them. An allocation failure
+// cannot be recovered from in a launcher, so it ends the launch through the
+// fatal path.
 #include <cstdlib>
 #include <cwchar>
 
@@ -11,8 +12,7 @@ namespace {
 String allocString(unsigned long len, const char* failureMessage) {
     String s = static_cast<String>(malloc((len + 1) * sizeof(wchar_t)));
     if (s == nullptr) {
-        fatalErrorA(failureMessage, true);
-        return nullptr;
+        fatalErrorExit(failureMessage);
     }
     s[0] = 0;
     return s;
@@ -30,6 +30,13 @@ String freeString(String s) {
 }
 
 String initMemString(String str1, const wchar_t* str2) { return wcscat(str1, str2); }
+
+wstring nativePath(wstring path) {
+    convertToOsSeparator(path);
+    return path;
+}
+
+wstring joinPath(const wstring& dir, const wstring& name) { return nativePath(name.empty() ? dir : dir + L"/" + name); }
 
 String copyString(const wchar_t* text) {
     if (text == nullptr) text = L"";

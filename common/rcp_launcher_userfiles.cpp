@@ -81,19 +81,15 @@ wstring getCoreFileLocation(const wstring& coreLocation, const wchar_t* filename
     const wstring name = filename != nullptr ? filename : L"";
     // An empty sub-folder deliberately leaves "config//name": the path is
     // still valid and matches what existing installations expect.
-    wstring candidate = coreLocation + L"/" + CORE_CONFIG_DIR + L"/" + coreSubFolder() + L"/" + name;
-    convertToOsSeparator(candidate);
+    const wstring candidate = joinPath(coreLocation, wstring(CORE_CONFIG_DIR) + L"/" + coreSubFolder() + L"/" + name);
     if (exists(candidate.c_str())) return candidate;
 
-    wstring fallback = coreLocation + L"/" + name;
-    convertToOsSeparator(fallback);
-    return fallback;
+    return joinPath(coreLocation, name);
 }
 
 wstring createRCPInstallProps(const wstring& workspaceLocation, const wstring& configLocation,
                               const wstring& baseLocation, const wstring& installDir, std::vector<String> propsArray) {
-    wstring propPath = configLocation + L"/" + INSTALL_PROPS;
-    convertToOsSeparator(propPath);
+    const wstring propPath = joinPath(configLocation, INSTALL_PROPS);
     if (exists(propPath.c_str())) return propPath;
 
     // The plain copy is made under a name of its own and only the finished
@@ -104,8 +100,7 @@ wstring createRCPInstallProps(const wstring& workspaceLocation, const wstring& c
     const wstring basePath = getCoreFileLocation(baseLocation, INSTALL_PROPS);
     const wstring copyPath = propPath + BASE_COPY_SUFFIX;
     if (!copyFile(basePath.c_str(), copyPath.c_str())) {
-        fatalErrorA("RLNCH0022E: Unable to copy rcpinstall.properties to the user directory.", true);
-        return propPath;
+        fatalErrorExit("RLNCH0022E: Unable to copy rcpinstall.properties to the user directory.");
     }
 
     // Without the required values the launch ends while the copy is
@@ -138,10 +133,8 @@ int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propP
                                 const wstring& installDir, std::vector<String>& propsArray) {
     (void)workspaceLocation;
     (void)installDir;
-    wstring inPath = propPath;
-    convertToOsSeparator(inPath);
-    wstring outPath = newPropPath;
-    convertToOsSeparator(outPath);
+    const wstring inPath = nativePath(propPath);
+    const wstring outPath = nativePath(newPropPath);
 
     FILE* in = nullptr;
     open_file(in, inPath.c_str(), L"r");
@@ -203,9 +196,7 @@ int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propP
     if (missing > 0) {
         // The plain copy stays in place (and the work file beside it).
         fclose(out);
-        fatalErrorA("RLNCH0008E: Unable to calculate necessary values for user specific rcpinstall.properties file.",
-                    true);
-        return -1;
+        fatalErrorExit("RLNCH0008E: Unable to calculate necessary values for user specific rcpinstall.properties file.");
     }
 
     // The block is expanded as a text without arguments ("%%" gives "%"),
@@ -220,15 +211,14 @@ int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propP
 }
 
 void createConfigIni(const wstring& configLocation, const wstring& baseLocation) {
-    wstring target = configLocation + L"/" + CONFIG_INI;
-    convertToOsSeparator(target);
+    const wstring target = joinPath(configLocation, CONFIG_INI);
     if (exists(target.c_str())) return;
 
     // copyFile puts the file in place only once it is complete, so a launch
     // killed during the copy leaves no cut file for later launches to keep.
     const wstring basePath = getCoreFileLocation(baseLocation, CONFIG_INI);
     if (!copyFile(basePath.c_str(), target.c_str()))
-        fatalErrorA("RLNCH0009E: Unable to copy config.ini to the user directory.", true);
+        fatalErrorExit("RLNCH0009E: Unable to copy config.ini to the user directory.");
     userFirstLaunch = true;
 }
 
@@ -237,18 +227,15 @@ int createPlatformXML(const wstring& configLocation, const wstring& baseLocation
     // A package-builder installation manages its own update sites.
     if (eConfig == userpb) return 0;
 
-    wstring updateDir = configLocation + L"/" + UPDATE_DIR;
-    convertToOsSeparator(updateDir);
+    const wstring updateDir = joinPath(configLocation, UPDATE_DIR);
     if (!isDirectory(updateDir.c_str())) {
         userFirstLaunch = true;
         if (!mkdirs(updateDir.c_str())) {
-            fatalErrorA("RLNCH0010E: Unable to create %ls directory.", updateDir.c_str(), true);
-            return -1;
+            fatalErrorExit("RLNCH0010E: Unable to create %ls directory.", updateDir.c_str());
         }
     }
 
-    wstring target = updateDir + L"/" + PLATFORM_XML;
-    convertToOsSeparator(target);
+    const wstring target = joinPath(updateDir, PLATFORM_XML);
     if (exists(target.c_str())) return 0;
 
     // A managed update policy means the platform writes its own file.

@@ -200,8 +200,7 @@ bool getDebug() { return debug; }
 namespace {
 
 bool openLog(const std::wstring& logLocation, bool mustBeOwn) {
-    std::wstring path = logLocation + L"/" + RCP_LOG_FILE;
-    convertToOsSeparator(path);
+    const std::wstring path = joinPath(logLocation, RCP_LOG_FILE);
     std::string npath;
     wstrtocs(npath, path);
     FILE* fp = openLogStream(npath, mustBeOwn);
@@ -291,41 +290,53 @@ void fatalError(const char* fmt, ...) {
     va_end(ap);
 }
 
-void fatalErrorA(const char* msg, bool bExit) {
-    int savedErrno = errno;
-    std::string text = formatWithSpareArgs(msg ? msg : "", {});
+namespace {
+
+// One error line of an already formatted text, with the system text of the
+// errno that held when the caller was entered; then, if asked, the end.
+void reportError(int savedErrno, const std::string& text, bool bExit) {
     errno = savedErrno;
     errorLine("%s", text.c_str());
     if (bExit) exitSequence();
+}
+
+}  // namespace
+
+void fatalErrorA(const char* msg, bool bExit) {
+    const int savedErrno = errno;
+    reportError(savedErrno, formatWithSpareArgs(msg ? msg : "", {}), bExit);
 }
 
 void fatalErrorA(const char* msg, const char* arg, bool bExit) {
-    int savedErrno = errno;
-    std::string text = formatWithSpareArgs(msg ? msg : "", {strArg(arg)});
-    errno = savedErrno;
-    errorLine("%s", text.c_str());
-    if (bExit) exitSequence();
+    const int savedErrno = errno;
+    reportError(savedErrno, formatWithSpareArgs(msg ? msg : "", {strArg(arg)}), bExit);
 }
 
 void fatalErrorA(const char* msg, const wchar_t* arg, bool bExit) {
-    int savedErrno = errno;
+    const int savedErrno = errno;
     std::string narg;
     wcstochar(narg, arg ? arg : L"");
-    std::string text = formatWithSpareArgs(narrowFormatForWideArg(msg ? msg : ""), {strArg(narg.c_str())});
-    errno = savedErrno;
-    errorLine("%s", text.c_str());
-    if (bExit) exitSequence();
+    reportError(savedErrno, formatWithSpareArgs(narrowFormatForWideArg(msg ? msg : ""), {strArg(narg.c_str())}), bExit);
 }
 
 void fatalErrorW(const wchar_t* mgs, bool bExit) {
-    int savedErrno = errno;
+    const int savedErrno = errno;
     std::string fmt;
     wcstochar(fmt, mgs ? mgs : L"");
-    std::string text = formatWithSpareArgs(fmt, {});
-    errno = savedErrno;
-    errorLine("%s", text.c_str());
-    if (bExit) exitSequence();
+    reportError(savedErrno, formatWithSpareArgs(fmt, {}), bExit);
 }
+
+void fatalErrorExit(const char* msg) {
+    fatalErrorA(msg, false);
+    exitSequence();
+}
+
+void fatalErrorExit(const char* msg, const wchar_t* arg) {
+    fatalErrorA(msg, arg, false);
+    exitSequence();
+}
+
+void exitLauncher(int status) { exit(status); }
 
 const std::string& getLogQueue() { return logque; }
 

@@ -93,7 +93,7 @@ void launchEclipse(int argc, wchar_t** wargv) {
 }
 
 int launcherMain(int argc, char** argv) {
-    if (setlocale(LC_CTYPE, "") == nullptr) fatalErrorA("RLNCH0182E: Set locale error!", true);
+    if (setlocale(LC_CTYPE, "") == nullptr) fatalErrorExit("RLNCH0182E: Set locale error!");
 
     std::vector<wchar_t*> wargv(static_cast<size_t>(argc) + 1, nullptr);
     for (int i = 0; i < argc; ++i) wargv[static_cast<size_t>(i)] = chartowcs(argv[i]);

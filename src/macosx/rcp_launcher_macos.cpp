@@ -42,7 +42,7 @@ struct PostSessionCommand {
 [[noreturn]] void executablePathFailed(int err)
 {
     snprintf(tempOutBuffer, sizeof(tempOutBuffer), "RLNCH0184E: Getting executable path failed! errno = %d", err);
-    fatalErrorA(tempOutBuffer, true);
+    fatalErrorExit(tempOutBuffer);
     exit(-1);  // not reached: fatalErrorA with its exit flag ends the process
 }
 
@@ -137,8 +137,7 @@ void readsymln(std::string& target, const char* link)
     }
     if (n < 0 || static_cast<size_t>(n) >= sizeof(buffer)) {
         snprintf(tempOutBuffer, sizeof(tempOutBuffer), "RLNCH0184E: Getting command path failed! errno = %d", errno);
-        fatalErrorA(tempOutBuffer, true);
-        return;
+        fatalErrorExit(tempOutBuffer);
     }
     target.assign(buffer, static_cast<size_t>(n));
 }
@@ -174,8 +173,7 @@ void getInstallDir(std::wstring& installDir, int argc, wchar_t** argv)
     wchar_t* dir = getRCPDirectory(argc, argv);
     if (dir == nullptr) {
         installDir.clear();
-        fatalErrorA("RLNCH0049E: Unable to locate the platform's installation directory", true);
-        return;
+        fatalErrorExit("RLNCH0049E: Unable to locate the platform's installation directory");
     }
     std::wstring candidate(dir);
     freeString(dir);
@@ -218,7 +216,7 @@ void getServiceInstallDir(std::wstring& serviceDir, std::wstring& installDir, in
         }
     }
     const wchar_t* program = (argc > 0 && argv != nullptr && argv[0] != nullptr) ? argv[0] : L"";
-    fatalErrorA("RLNCH0048E: Unable to locate the directory containing %ls", program, true);
+    fatalErrorExit("RLNCH0048E: Unable to locate the directory containing %ls", program);
 }
 
 const wchar_t* getOS()

@@ -72,16 +72,13 @@ bool unsetEnv(const wchar_t* key) {
 }
 
 void addEnvSetToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
-    String* found = findProperties(ENV_SET_PREFIX, rcpInstallPropertiesArray);
-    if (found == nullptr) return;
-    for (size_t i = 0; found[i] != nullptr && found[i][0] != L'\0'; i += 2) {
+    forEachProperty(ENV_SET_PREFIX, rcpInstallPropertiesArray, [](const wchar_t* key, const wchar_t* value) {
         // The name is whatever follows the first 8 characters ("env.set."),
         // counted, not searched: "env.setNAME" sets "AME". The bare key
         // "env.set" has no name at all.
-        if (wcslen(found[i]) < ENV_SET_NAME_OFFSET) continue;
-        setEnv(found[i] + ENV_SET_NAME_OFFSET, found[i + 1] != nullptr ? found[i + 1] : L"", true);
-    }
-    free(found);
+        if (wcslen(key) >= ENV_SET_NAME_OFFSET) setEnv(key + ENV_SET_NAME_OFFSET, value, true);
+        return true;
+    });
 }
 
 void addLibpathToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
@@ -118,8 +115,7 @@ void addLdPreloadToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
     if (ldPreload == nullptr) return;
     String IDString = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
     if (IDString == nullptr) {
-        fatalErrorA("RLNCH0005E: Couldn't find the rcp.install.id property!", true);
-        return;
+        fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
     }
     setPreload(ldPreload, IDString);
 }
@@ -147,16 +143,14 @@ void setPreload(const wchar_t* ldPreload, const wchar_t* IDString) {
 
     size_t filenamePos = ldPreloadA.rfind('/');
     if (filenamePos == std::string::npos) {
-        fatalErrorA("RLNCH0189E: Couldn't find filename for library.preload property", true);
-        return;
+        fatalErrorExit("RLNCH0189E: Couldn't find filename for library.preload property");
     }
     std::string preloadName = ldPreloadA.substr(filenamePos + 1);
     SvcDebugOutA("setPreload():library name = %s", preloadName.c_str());
 
     const char* userName = getenv(USER_IN_ENV_STRINGA);
     if (userName == nullptr) {
-        fatalErrorA("RLNCH0006E: Couldn't find the user name!", true);
-        return;
+        fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
     }
 
     std::string linkPath = std::string(TEMPDIR_STRINGA) + "/" + TEMPPREFIX_STRINGA + DOT_CHARA + userName + DOT_CHARA +

@@ -160,7 +160,7 @@ int copyFile(const wchar_t* origFile, const wchar_t* newFile)
     FILE* in = nullptr;
     open_file(in, origText, L"r");
     if (in == nullptr) {
-        fatalErrorA("RLNCH0190E: Unable to open source file %ls to be copied", origText, true);
+        fatalErrorExit("RLNCH0190E: Unable to open source file %ls to be copied", origText);
     }
     // Bytes, not text: a copy must never fail because the file is not in
     // the locale's encoding (a launch from the Finder has no LANG at all).
@@ -168,7 +168,7 @@ int copyFile(const wchar_t* origFile, const wchar_t* newFile)
     FILE* out = newFile != nullptr ? createWorkFile(work) : nullptr;
     if (out == nullptr) {
         fclose(in);
-        fatalErrorA("RLNCH0191E: Unable to open destination file %ls to be copied to", newText, true);
+        fatalErrorExit("RLNCH0191E: Unable to open destination file %ls to be copied to", newText);
     }
     char buffer[COPY_BUFFER_BYTES];
     size_t n;
@@ -180,10 +180,10 @@ int copyFile(const wchar_t* origFile, const wchar_t* newFile)
     // full disk), leaves no file behind; nor does a read that stopped early.
     if (!readAll && written) {
         finishWorkFile(out, work);
-        fatalErrorA("RLNCH0193E: Did not encounter EOF while copying file contents", true);
+        fatalErrorExit("RLNCH0193E: Did not encounter EOF while copying file contents");
     }
     if (!commitWorkFile(out, work, newText)) {
-        fatalErrorA("RLNCH0192E: Encountered error copying file contents", true);
+        fatalErrorExit("RLNCH0192E: Encountered error copying file contents");
     }
     return 1;
 }

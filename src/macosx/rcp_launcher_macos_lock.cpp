@@ -47,7 +47,7 @@ void createAndOpenLockFile()
         }
     }
     if (lockFILE == nullptr) {
-        fatalErrorA("RLNCH0054E: Error locating platform lock file", true);
+        fatalErrorExit("RLNCH0054E: Error locating platform lock file");
     }
     fwide(lockFILE, -1);
 }
@@ -55,8 +55,7 @@ void createAndOpenLockFile()
 void lockLockFile(const std::wstring& sidFilePath)
 {
     if (lockFILE == nullptr) {
-        fatalErrorA("RLNCH0054E: Error locating platform lock file", true);
-        return;
+        fatalErrorExit("RLNCH0054E: Error locating platform lock file");
     }
     // Blocks while another launcher of this workspace holds the lock, that is
     // until it has started its child.

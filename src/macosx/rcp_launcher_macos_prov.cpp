@@ -22,8 +22,7 @@ void doProvisioning(std::vector<String>& /*launcherPropsArray*/, std::vector<Str
         wstrtocs(argA, arg);
         char* copy = strdup(argA.c_str());
         if (copy == nullptr) {
-            fatalErrorA("RLNCH0004E: malloc failed!", true);
-            return;
+            fatalErrorExit("RLNCH0004E: malloc failed!");
         }
         cargs.push_back(copy);
         SvcDebugOutA("%s", copy);
