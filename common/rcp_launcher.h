@@ -73,6 +73,9 @@ int launcherMain(int argc, char** argv);
 
 // ===================== Launcher options (rcp_launcher_options) ===============
 int findOption(const wchar_t* opt, int argc, wchar_t** argv);  // index >= 1 or -1
+// The argument after the first opt, or null when opt is absent or the last
+// argument: an option without its value counts as absent.
+const wchar_t* optionValue(const wchar_t* opt, int argc, wchar_t** argv);
 bool isDebug(int argc, wchar_t** argv);
 bool isRestart(int argc, wchar_t** argv);
 bool isResetConfig(int argc, wchar_t** argv);
@@ -158,6 +161,9 @@ void replaceFirstRcpHome(wstring& text, const wstring& installDir);
 
 // ===================== Install configuration (rcp_launcher_installcfg) =======
 bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArray, bool muservice);
+// service or multiuser_service: the JVM itself is the child, with the class
+// path and main class on its command line, instead of the Eclipse executable.
+bool isServiceConfig();
 
 // ===================== JVM selection (rcp_launcher_cmdline) ==================
 void addVmToCommandLine(std::vector<String>& rcpInstallPropertiesArray, std::vector<String>& rcpLauncherPropertiesArray,

@@ -78,9 +78,8 @@ int getWorkspaceLocation(wstring& workspaceLocation, std::vector<String>& rcpIns
     }
 
     // "-data" as the last argument has no value and is ignored.
-    const int dataIndex = findOption(DATAARG, argc, argv);
-    if (dataIndex >= 1 && dataIndex + 1 < argc && argv[dataIndex + 1] != nullptr) {
-        workspaceLocation = argv[dataIndex + 1];
+    if (const wchar_t* data = optionValue(DATAARG, argc, argv)) {
+        workspaceLocation = data;
         removeOneTrailingSeparator(workspaceLocation);
         return 1;
     }

@@ -10,9 +10,6 @@
 
 namespace {
 
-// The two configurations in which the JVM itself is the child's executable.
-bool jvmIsTheChild() { return eConfig == service || eConfig == multiuser_service; }
-
 // Shared by isJavaw and replaceJavaExecutableName: the path with its trailing
 // executable name swapped, or false when the path does not end with that name.
 bool swapExecutableName(const wstring& vmString, const wchar_t* from, const wchar_t* to, wstring& swapped) {
@@ -39,32 +36,24 @@ wstring requireBaseLocation(const std::vector<String>& props) {
 
 void addVmToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
                         std::vector<String>& /*rcpLauncherPropertiesArray*/, int argc, wchar_t** argv) {
-    int consoleIdx = findOption(CONSOLEARG, argc, argv);
-    int consoleLogIdx = findOption(CONSOLELOGARG, argc, argv);
-    int rcpLauncherWait = findOption(RCPLAUNCHERWAIT, argc, argv);
-    // Console mode changes nothing on this platform; it is only worked out.
-    bool consoleMode = consoleIdx != -1 || consoleLogIdx != -1;
-    (void)consoleMode;
-    if (rcpLauncherWait != -1) setWaitMode();
+    // "-console" and "-consoleLog" change nothing here on this platform.
+    if (findOption(RCPLAUNCHERWAIT, argc, argv) != -1) setWaitMode();
 
     // The user's "-vm" beats the installation's "vm" property. A "-vm" with
     // nothing after it names no JVM and is treated as absent.
     wstring vmString;
-    int vmOverride = findOption(VMARG, argc, argv);
-    if (vmOverride != -1 && vmOverride + 1 < argc && argv[vmOverride + 1] != nullptr) {
-        vmString = argv[vmOverride + 1];
+    if (const wchar_t* vmOverride = optionValue(VMARG, argc, argv)) {
+        vmString = vmOverride;
     } else {
         String vm = findProperty(VM, rcpInstallPropertiesArray);
-        if (vm == nullptr) {
-            fatalErrorExit("RLNCH0002E: vm string must be specified!");
-        }
+        if (vm == nullptr) fatalErrorExit("RLNCH0002E: vm string must be specified!");
         vmString = vm;
     }
 
     // The child must never inherit a JAVA_HOME pointing at some other JVM.
     unsetEnv(JAVA_HOME_KEY);
 
-    if (jvmIsTheChild()) {
+    if (isServiceConfig()) {
         addPathToCommandLine(vmString);
     } else {
         addArgToCommandLine(VMARG);
@@ -108,12 +97,8 @@ void addBaseEclipseToCommandLine(std::vector<String>& rcpInstallPropertiesArray)
 void addStartupToCommandLine(std::vector<String> propArray, int argc, wchar_t** argv) {
     addArgToCommandLine(STARTUPARG);
     // A "-perfJar" without a value is ignored: the default jar is used.
-    int perfJarIdx = findOption(PERFJARARG, argc, argv);
-    if (perfJarIdx != -1 && perfJarIdx + 1 < argc && argv[perfJarIdx + 1] != nullptr) {
-        addArgToCommandLine(argv[perfJarIdx + 1]);
-        return;
-    }
-    addArgToCommandLine(requireBaseLocation(propArray) + L"/" + LAUNCHER_JAR);
+    const wchar_t* perfJar = optionValue(PERFJARARG, argc, argv);
+    addArgToCommandLine(perfJar ? wstring(perfJar) : requireBaseLocation(propArray) + L"/" + LAUNCHER_JAR);
 }
 
 void addClasspathToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {

@@ -28,7 +28,7 @@ void addMainOptionsToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
     int personalityIdx = findOption(PERSONALITYARG, argc, argv);
     int resetconfigIdx = findOption(RESETCONFIGARG, argc, argv);
 
-    if (eConfig == service || eConfig == multiuser_service) addArgToCommandLine(NOSPLASHARG);
+    if (isServiceConfig()) addArgToCommandLine(NOSPLASHARG);
 
     int vmIdx = findOption(VMARG, argc, argv);
     int vmargsIdx = findOption(VMARGS, argc, argv);

@@ -43,7 +43,7 @@ void addVmargsToCommandLine(const wstring& workspaceLocation, std::vector<String
                             int argc, wchar_t** argv) {
     // The Eclipse executable hands everything after "-vmargs" to the JVM; a
     // directly started JVM needs no separator.
-    if (eConfig != service && eConfig != multiuser_service) addArgToCommandLine(VMARGS);
+    if (!isServiceConfig()) addArgToCommandLine(VMARGS);
 
     // The user's own VM arguments come before every configured one.
     int vmargsIdx = findOption(VMARGS, argc, argv);

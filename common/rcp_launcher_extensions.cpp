@@ -19,9 +19,10 @@ const wchar_t* const SINGLE_VALUED_OPTIONS[] = {VMARG,   DATAARG,        PLUGINC
 bool addConfigExtentionsToArg(int* cargc, wchar_t*** cargv, int argc, wchar_t** argv,
                               std::vector<String> rcpLauncherPropertiesArray, std::vector<wstring>& newargs) {
     if (cargc == nullptr || cargv == nullptr || argv == nullptr) return false;
+    const wchar_t* configName = optionValue(CONFIGOPTARG, argc, argv);
+    if (configName == nullptr) return false;
+    const wstring configOption = configName;
     const int configOptionIDX = findOption(CONFIGOPTARG, argc, argv);
-    if (configOptionIDX == -1 || configOptionIDX + 1 >= argc || argv[configOptionIDX + 1] == nullptr) return false;
-    const wstring configOption = argv[configOptionIDX + 1];
 
     // cargv will point into newargs, so it must hold exactly this call's list.
     newargs.clear();

@@ -7,6 +7,8 @@
 installCfg eConfig = undefined;
 bool IS_LOCKDOWN = false;
 
+bool isServiceConfig() { return eConfig == service || eConfig == multiuser_service; }
+
 bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArray, bool muservice) {
     IS_LOCKDOWN = false;
     const wchar_t* value = findProperty(CONFIGURATION_PROPERTY, rcpInstallPropertiesArray);

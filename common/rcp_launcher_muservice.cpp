@@ -94,7 +94,7 @@ void getUserCmdString(const wstring& workspaceLocation, int argc, wchar_t** argv
         addDashDToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv, installDir);
         addXargsToCommandLine(rcpInstallPropertiesArray);
         addClasspathToCommandLine(rcpInstallPropertiesArray);
-    } else if (eConfig == service || eConfig == multiuser_service) {
+    } else if (isServiceConfig()) {
         addVmToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv);
         addVmargsToCommandLine(workspaceLocation, rcpInstallPropertiesArray, argc, argv);
         addDashDToCommandLine(rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc, argv, installDir);

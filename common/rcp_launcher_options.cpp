@@ -15,6 +15,11 @@ int findOption(const wchar_t* opt, int argc, wchar_t** argv) {
     return -1;
 }
 
+const wchar_t* optionValue(const wchar_t* opt, int argc, wchar_t** argv) {
+    const int i = findOption(opt, argc, argv);
+    return i != -1 && i + 1 < argc ? argv[i + 1] : nullptr;
+}
+
 bool isDebug(int argc, wchar_t** argv) {
     // A restarted launcher never writes debug output.
     if (findOption(RESTARTARG, argc, argv) != -1) return false;

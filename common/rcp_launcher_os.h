@@ -144,6 +144,10 @@ void sysSleep(int seconds);
 
 // ===================== Installation discovery (rcp_launcher_macos) ===========
 void read_executable_path(std::string& path);
+// The target of a symbolic link, whatever its length; false (errno set) when
+// it cannot be read.
+bool readLink(const char* path, std::string& target);
+// readLink, where a failure or a target of 1024 bytes or more is fatal.
 void readsymln(std::string& target, const char* link);
 void findCommand(wchar_t*& cmd, wchar_t* arg);
 wchar_t* getRCPDirectory(int argc, wchar_t** argv);

@@ -48,9 +48,7 @@ void replaceArea(const wstring& workspaceLocation, const wstring& configLocation
     const wstring area = nativePath(configLocation);
     const wstring updateDir = updateDirOf(configLocation);
     handleDirMove(backupOf(configLocation), area, true);
-    if (!mkdirs(updateDir.c_str())) {
-        fatalErrorExit("RLNCH0010E: Unable to create %ls directory.", updateDir.c_str());
-    }
+    ensureDirectory(updateDir);
     handleFileMove(updateDir, REGISTRY_FILE, workspaceLocation, REGISTRY_SAVED, false);
 }
 

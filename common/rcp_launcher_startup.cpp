@@ -171,15 +171,14 @@ wstring jvmPropertiesBeside(wstring vmString) {
 // false when a "-vm" value is too shallow to hold a jvm.properties: the launch
 // then goes on without building a command line.
 bool readJvmProperties(Startup& s) {
-    int vmIdx = findOption(VMARG, s.cargc, s.cargv);
-    // "-vm" without a value counts as no "-vm".
-    if (vmIdx == -1 || vmIdx + 1 >= s.cargc) {
+    const wchar_t* vm = optionValue(VMARG, s.cargc, s.cargv);
+    if (vm == nullptr) {
         wstring jvmPropLocation;
         if (getJvmPropertyLocation(s.rcpInstallPropertiesArray, s.installDir, jvmPropLocation))
             getProperties(jvmPropLocation, s.rcpInstallPropertiesArray);
         return true;
     }
-    wstring jvmPropLocation = jvmPropertiesBeside(s.cargv[vmIdx + 1]);
+    wstring jvmPropLocation = jvmPropertiesBeside(vm);
     if (jvmPropLocation.empty()) return false;
     if (exists(jvmPropLocation.c_str())) getProperties(jvmPropLocation, s.rcpInstallPropertiesArray);
     return true;

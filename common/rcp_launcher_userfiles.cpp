@@ -228,12 +228,7 @@ int createPlatformXML(const wstring& configLocation, const wstring& baseLocation
     if (eConfig == userpb) return 0;
 
     const wstring updateDir = joinPath(configLocation, UPDATE_DIR);
-    if (!isDirectory(updateDir.c_str())) {
-        userFirstLaunch = true;
-        if (!mkdirs(updateDir.c_str())) {
-            fatalErrorExit("RLNCH0010E: Unable to create %ls directory.", updateDir.c_str());
-        }
-    }
+    ensureDirectory(updateDir);
 
     const wstring target = joinPath(updateDir, PLATFORM_XML);
     if (exists(target.c_str())) return 0;

@@ -26,8 +26,8 @@ namespace {
 
 // The executable path buffer: 1024 bytes of path plus the terminator.
 const size_t EXE_PATH_BUFFER = 1025;
-// readsymln's buffer; a target that fills it may have been cut.
-const size_t LINK_BUFFER = 1024;
+// readsymln accepts targets shorter than this.
+const size_t LINK_LIMIT = 1024;
 // Longest executable path accepted from the system when the first buffer is
 // too small.
 const size_t EXE_PATH_LIMIT = 65536;
@@ -43,7 +43,6 @@ struct PostSessionCommand {
 {
     snprintf(tempOutBuffer, sizeof(tempOutBuffer), "RLNCH0184E: Getting executable path failed! errno = %d", err);
     fatalErrorExit(tempOutBuffer);
-    exit(-1);  // not reached: fatalErrorA with its exit flag ends the process
 }
 
 // The raw path of the running executable as the system reports it.
@@ -66,19 +65,11 @@ std::string systemExecutablePath()
     buffer.back() = '\0';
     return std::string(buffer.data());
 #else
-    // readlink does not terminate and silently cuts a long target, so the
-    // buffer grows until the answer fits with room to spare.
-    for (size_t size = EXE_PATH_BUFFER; size <= EXE_PATH_LIMIT; size *= 4) {
-        std::vector<char> buffer(size, '\0');
-        ssize_t n = readlink("/proc/self/exe", buffer.data(), buffer.size());
-        if (n < 0) {
-            executablePathFailed(errno);
-        }
-        if (static_cast<size_t>(n) < buffer.size()) {
-            return std::string(buffer.data(), static_cast<size_t>(n));
-        }
+    std::string path;
+    if (!readLink("/proc/self/exe", path)) {
+        executablePathFailed(errno);
     }
-    executablePathFailed(ENAMETOOLONG);
+    return path;
 #endif
 }
 
@@ -126,20 +117,35 @@ void read_executable_path(std::string& path)
     SvcDebugOutA(path.c_str());
 }
 
+bool readLink(const char* path, std::string& target)
+{
+    // readlink does not terminate and silently cuts a long target, so the
+    // buffer grows until the answer fits with room to spare.
+    std::vector<char> buffer(LINK_LIMIT);
+    for (;;) {
+        ssize_t n = readlink(path, buffer.data(), buffer.size());
+        if (n < 0) {
+            return false;
+        }
+        if (static_cast<size_t>(n) < buffer.size()) {
+            target.assign(buffer.data(), static_cast<size_t>(n));
+            return true;
+        }
+        if (buffer.size() >= EXE_PATH_LIMIT) {
+            errno = ENAMETOOLONG;
+            return false;
+        }
+        buffer.resize(buffer.size() * 4);
+    }
+}
+
 void readsymln(std::string& target, const char* link)
 {
-    char buffer[LINK_BUFFER];
-    ssize_t n = -1;
-    if (link == nullptr) {
-        errno = EINVAL;
-    } else {
-        n = readlink(link, buffer, sizeof(buffer));
-    }
-    if (n < 0 || static_cast<size_t>(n) >= sizeof(buffer)) {
+    errno = EINVAL;
+    if (link == nullptr || !readLink(link, target) || target.size() >= LINK_LIMIT) {
         snprintf(tempOutBuffer, sizeof(tempOutBuffer), "RLNCH0184E: Getting command path failed! errno = %d", errno);
         fatalErrorExit(tempOutBuffer);
     }
-    target.assign(buffer, static_cast<size_t>(n));
 }
 
 // cmd must be null or a String of this program (newString/chartowcs): it is

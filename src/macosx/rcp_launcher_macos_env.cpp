@@ -20,22 +20,6 @@ namespace {
 // Characters of "env.set." dropped from a key to get the variable's name.
 constexpr size_t ENV_SET_NAME_OFFSET = 8;
 
-// The target of a symbolic link, or false when it cannot be read. Unlike
-// readsymln this never ends the process: the link may belong to someone else.
-bool readLinkTarget(const std::string& path, std::string& target) {
-    std::vector<char> buf(1024);
-    for (;;) {
-        ssize_t n = readlink(path.c_str(), buf.data(), buf.size());
-        if (n < 0) return false;
-        if (static_cast<size_t>(n) < buf.size()) {
-            target.assign(buf.data(), static_cast<size_t>(n));
-            return true;
-        }
-        if (buf.size() >= 65536) return false;
-        buf.resize(buf.size() * 2);
-    }
-}
-
 // True when linkPath is a symbolic link that this user owns and that points to
 // target. Only such a link may be handed to the dynamic loader: a link or a
 // file planted in /tmp by another user could be swapped for anything.
@@ -44,7 +28,7 @@ bool isOwnLinkTo(const std::string& linkPath, const std::string& target) {
     if (lstat(linkPath.c_str(), &st) != 0) return false;
     if (!S_ISLNK(st.st_mode) || st.st_uid != geteuid()) return false;
     std::string current;
-    return readLinkTarget(linkPath, current) && current == target;
+    return readLink(linkPath.c_str(), current) && current == target;
 }
 
 void logPreloadVariable() {
@@ -163,7 +147,7 @@ void setPreload(const wchar_t* ldPreload, const wchar_t* IDString) {
     if (lstat(linkPath.c_str(), &st) == 0) {
         SvcDebugOutA("setPreload(): link path already exists.");
         std::string target;
-        if (S_ISLNK(st.st_mode) && readLinkTarget(linkPath, target)) {
+        if (S_ISLNK(st.st_mode) && readLink(linkPath.c_str(), target)) {
             SvcDebugOutA("setPreload(): existing link is to: %s", target.c_str());
             if (target != ldPreloadA && st.st_uid == geteuid()) {
                 SvcDebugOutA("setPreload(): removing existing link ...");
