@@ -35,19 +35,19 @@ enum installCfg {
     userpb = 8
 };
 
-extern installCfg eConfig;      // set by SetInstallConfiguration
-extern bool IS_LOCKDOWN;        // true for the lockdown configuration
-extern bool bWaitMode;          // setWaitMode
-extern bool runningLock;        // this launcher is the main process
-extern bool bRestart;           // "-restart" among the launcher's arguments
-extern bool userFirstLaunch;    // this launch created a user's directories/files
-extern long pid;                // process id last read from the lock file
-extern wstring lockFilePath;    // <workspace>/.rcp.lock
-extern FILE* lockFILE;          // the open lock file ("r+")
+extern installCfg eConfig;    // set by SetInstallConfiguration
+extern bool IS_LOCKDOWN;      // true for the lockdown configuration
+extern bool bWaitMode;        // setWaitMode
+extern bool runningLock;      // this launcher is the main process
+extern bool bRestart;         // "-restart" among the launcher's arguments
+extern bool userFirstLaunch;  // this launch created a user's directories/files
+extern long pid;              // process id last read from the lock file
+extern wstring lockFilePath;  // <workspace>/.rcp.lock
+extern FILE* lockFILE;        // the open lock file ("r+")
 
 // ===================== Allocation (rcp_launcher_strings) =====================
-String newString(unsigned long len);  // len characters + terminator, empty
-String freeString(String s);          // frees, returns null
+String newString(unsigned long len);                     // len characters + terminator, empty
+String freeString(String s);                             // frees, returns null
 String initMemString(String str1, const wchar_t* str2);  // wcscat, returns str1
 // A new String holding a copy of text.
 String copyString(const wchar_t* text);
@@ -141,14 +141,12 @@ void addHexDigits(wstring& out, unsigned int code);
 FILE* open_prop_file(FILE*& fp, const char* path, const char* mode);
 
 // ===================== Placeholders (rcp_launcher_placeholders) ==============
-bool replaceStdPlaceholders(const wstring& workspaceLocation, const wstring& installDir,
-                            wstring& placeholderString);
-size_t findLastPlaceholder(const wstring& prop_contents, size_t prop_lastIndex, size_t& ph_numchars,
-                           wstring& ph_key);
+bool replaceStdPlaceholders(const wstring& workspaceLocation, const wstring& installDir, wstring& placeholderString);
+size_t findLastPlaceholder(const wstring& prop_contents, size_t prop_lastIndex, size_t& ph_numchars, wstring& ph_key);
 bool getPlaceholderValue(const wstring& key, wstring& value, const std::vector<String>& propArray);
 bool replaceUserPlaceholders(wstring& prop_contents, const std::vector<String>& propArray);
-bool replaceAllPlaceholders(const wstring& workspaceLocation, const wstring& installDir,
-                            wstring& placeholderString, std::vector<String>& rcpInstallPropertiesArray);
+bool replaceAllPlaceholders(const wstring& workspaceLocation, const wstring& installDir, wstring& placeholderString,
+                            std::vector<String>& rcpInstallPropertiesArray);
 void replacePlaceholdersInRcpInstallProp(wstring workspaceLocation, wstring installDir,
                                          std::vector<String>& rcpInstallPropertiesArray);
 // Changed entries of argv (and cargv) point to expanded copies that live until
@@ -184,8 +182,8 @@ wstring requireBaseLocation(const std::vector<String>& props);
 
 // ===================== VM arguments and system properties (rcp_launcher_cmdline)
 void setArgProperty(wstring& prop, const wchar_t* key, const wchar_t* value);
-void addVmargsToCommandLine(const wstring& workspaceLocation, std::vector<String>& rcpInstallPropertiesArray,
-                            int argc, wchar_t** argv);
+void addVmargsToCommandLine(const wstring& workspaceLocation, std::vector<String>& rcpInstallPropertiesArray, int argc,
+                            wchar_t** argv);
 void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
                            std::vector<String>& rcpLauncherPropertiesArray, int argc, wchar_t** argv,
                            wstring& installDir);

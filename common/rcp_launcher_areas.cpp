@@ -53,7 +53,8 @@ String getInstallID(wstring rcp_launcher_properties_file, std::vector<String>& r
     FILE* fp = nullptr;
     open_wfile(fp, rcp_launcher_properties_file.c_str(), L"a+");
     if (fp == nullptr) {
-        fatalErrorExit("RLNCH0017E: Could not open %ls to append rcp.install.id!", rcp_launcher_properties_file.c_str());
+        fatalErrorExit("RLNCH0017E: Could not open %ls to append rcp.install.id!",
+                       rcp_launcher_properties_file.c_str());
     }
     const wstring line = wstring(RCP_INSTALL_ID_PROPERTY) + EQUALS_CHAR + installID + NEWLINE;
     // The line is formatted as a text without arguments, never handed to

@@ -39,8 +39,8 @@ void setArgProperty(wstring& prop, const wchar_t* key, const wchar_t* value) {
     prop += value != nullptr ? value : L"";
 }
 
-void addVmargsToCommandLine(const wstring& workspaceLocation, std::vector<String>& rcpInstallPropertiesArray,
-                            int argc, wchar_t** argv) {
+void addVmargsToCommandLine(const wstring& workspaceLocation, std::vector<String>& rcpInstallPropertiesArray, int argc,
+                            wchar_t** argv) {
     // The Eclipse executable hands everything after "-vmargs" to the JVM; a
     // directly started JVM needs no separator.
     if (!isServiceConfig()) addArgToCommandLine(VMARGS);

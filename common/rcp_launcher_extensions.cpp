@@ -11,8 +11,8 @@ namespace {
 // Options that the platform takes once; a second occurrence of the word
 // (not its value) is removed after the merge. "-personality" is listed twice
 // on purpose: a third occurrence goes as well.
-const wchar_t* const SINGLE_VALUED_OPTIONS[] = {VMARG,   DATAARG,        PLUGINCUSTARG, APPARG, PRODUCTARG,
-                                                PERSONALITYARG, NLARG, PERSONALITYARG, DIRARG};
+const wchar_t* const SINGLE_VALUED_OPTIONS[] = {VMARG,          DATAARG, PLUGINCUSTARG,  APPARG, PRODUCTARG,
+                                                PERSONALITYARG, NLARG,   PERSONALITYARG, DIRARG};
 
 }  // namespace
 

@@ -20,16 +20,12 @@ const int RESTART_WAIT_SECONDS = 20;
 
 }  // namespace
 
-void getLockFilePath(wstring& path)
-{
-    path = lockFilePath;
-}
+void getLockFilePath(wstring& path) { path = lockFilePath; }
 
 // True when the lock file names a process that still exists. A file that
 // does not start with a number (after blanks) cannot be trusted either way,
 // so the launch stops rather than start a second platform on the workspace.
-bool checkLockFile()
-{
+bool checkLockFile() {
     if (!exists(lockFilePath.c_str())) {
         return false;
     }
@@ -45,8 +41,7 @@ bool checkLockFile()
     fatalErrorExit("RLNCH0092E: Error reading platform lock file.");
 }
 
-void locateLockFile(int argc, wchar_t** argv, const wstring& workspace)
-{
+void locateLockFile(int argc, wchar_t** argv, const wstring& workspace) {
     lockFilePath = joinPath(workspace, RCP_LOCK_FILE);
     createAndOpenLockFile();
 

@@ -10,10 +10,7 @@ namespace {
 // paths are refused rather than cut, so a truncated path is never created.
 const size_t MKDIRS_BUFFER_CHARS = 1024;
 
-bool isSeparator(wchar_t ch)
-{
-    return ch == L'/' || ch == L'\\';
-}
+bool isSeparator(wchar_t ch) { return ch == L'/' || ch == L'\\'; }
 
 }  // namespace
 
@@ -22,8 +19,7 @@ bool isSeparator(wchar_t ch)
 // result is returned, so an already existing final directory gives 0 and
 // callers that need the directory test for it with isDirectory. A path with
 // no levels at all gives 1.
-int mkdirs(const wchar_t* path)
-{
+int mkdirs(const wchar_t* path) {
     if (path == nullptr) {
         return 1;
     }

@@ -151,8 +151,8 @@ void startupMUService(int argc, wchar_t** argv) {
 
     createMUServiceWkspc(workspaceLocation, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc,
                          argv);
-    getUserCmdString(workspaceLocation, argc, argv, installDir, rcpInstallPropertiesArray,
-                     rcpLauncherPropertiesArray, false, false);
+    getUserCmdString(workspaceLocation, argc, argv, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray,
+                     false, false);
 
     freeProperties(rcpInstallPropertiesArray);
     freeProperties(rcpLauncherPropertiesArray);

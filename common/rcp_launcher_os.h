@@ -31,9 +31,9 @@ bool dumpLogToTempLocation();
 
 // Debug output: written only while debug output is on; a format of 1000
 // characters or more is dropped silently.
-void SvcDebugOutA(const char* fString);                    // written as data ("%s")
-void SvcDebugOutA(const char* fString, const char* str);  // format + one string
-void SvcDebugOutA(const char* fString, int status);       // format + one integer
+void SvcDebugOutA(const char* fString);                         // written as data ("%s")
+void SvcDebugOutA(const char* fString, const char* str);        // format + one string
+void SvcDebugOutA(const char* fString, int status);             // format + one integer
 void SvcDebugOutW(const wchar_t* fString, const wchar_t* arg);  // narrow "%s" format
 // preString="v1, v2, ... " as one line; the assembled text is used as a format
 // with the count and the text as spare arguments.
@@ -62,7 +62,6 @@ void fatalErrorW(const wchar_t* mgs, bool bExit);
 // Scratch buffer for callers that pre-format a message carrying a number.
 inline constexpr size_t TEMP_OUT_BUFFER_SIZE = 1024;
 extern char tempOutBuffer[TEMP_OUT_BUFFER_SIZE];
-
 
 // ===================== String and environment utilities (rcp_launcher_utils_macos)
 // Conversions never fail on bad input: a byte that is not valid in the

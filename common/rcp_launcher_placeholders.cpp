@@ -85,8 +85,7 @@ void substitutionInvalid(wstring text) {
 
 }  // namespace
 
-bool replaceStdPlaceholders(const wstring& workspaceLocation, const wstring& installDir,
-                            wstring& placeholderString) {
+bool replaceStdPlaceholders(const wstring& workspaceLocation, const wstring& installDir, wstring& placeholderString) {
     bool modified = replaceAll(placeholderString, RCPHOME_REPLACE, installDir);
     modified = replaceAll(placeholderString, WORKSPACELOCATION_REPLACE, workspaceLocation) || modified;
     // The data area and the workspace are the same directory.
@@ -94,8 +93,7 @@ bool replaceStdPlaceholders(const wstring& workspaceLocation, const wstring& ins
     return modified;
 }
 
-size_t findLastPlaceholder(const wstring& prop_contents, size_t prop_lastIndex, size_t& ph_numchars,
-                           wstring& ph_key) {
+size_t findLastPlaceholder(const wstring& prop_contents, size_t prop_lastIndex, size_t& ph_numchars, wstring& ph_key) {
     if (prop_contents.empty()) return wstring::npos;
     // Nothing lies beyond the last character.
     if (prop_lastIndex >= prop_contents.length()) prop_lastIndex = prop_contents.length() - 1;
@@ -195,8 +193,8 @@ bool replaceUserPlaceholders(wstring& prop_contents, const std::vector<String>& 
     return bResult;
 }
 
-bool replaceAllPlaceholders(const wstring& workspaceLocation, const wstring& installDir,
-                            wstring& placeholderString, std::vector<String>& rcpInstallPropertiesArray) {
+bool replaceAllPlaceholders(const wstring& workspaceLocation, const wstring& installDir, wstring& placeholderString,
+                            std::vector<String>& rcpInstallPropertiesArray) {
     bool modified = replaceStdPlaceholders(workspaceLocation, installDir, placeholderString);
     wstring temp = placeholderString;
     if (!replaceUserPlaceholders(temp, rcpInstallPropertiesArray)) substitutionInvalid(temp);

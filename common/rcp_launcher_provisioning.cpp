@@ -25,8 +25,7 @@ bool isNewProvisioningLevel(const wchar_t* previous, const wchar_t* current) {
     return wcscmp(previous, current) != 0;
 }
 
-bool isInitialRequired(std::vector<String> rcpLauncherPropertiesArray,
-                       std::vector<String> rcpInstallPropertiesArray) {
+bool isInitialRequired(std::vector<String> rcpLauncherPropertiesArray, std::vector<String> rcpInstallPropertiesArray) {
     if (eConfig != user && eConfig != userpb && eConfig != multiuser) return false;
 
     std::vector<std::pair<const wchar_t*, const wchar_t*>> initial;
@@ -78,13 +77,13 @@ void checkForProvisioning(const wstring& workspaceLocation, int argc, wchar_t** 
 
     SvcDebugOutA(
         "RLNCH0076I: Detected platform initial launch or user initial launch. Executing platform provisioning.");
-    getUserCmdString(workspaceLocation, argc, argv, installDir, rcpInstallPropertiesArray,
-                     rcpLauncherPropertiesArray, true, !byInstaller);
+    getUserCmdString(workspaceLocation, argc, argv, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray,
+                     true, !byInstaller);
 
     if (eConfig == multiuser || eConfig == lockdown) {
         wstring serviceWorkspace = workspaceLocation;
-        createMUServiceWkspc(serviceWorkspace, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray,
-                             argc, argv);
+        createMUServiceWkspc(serviceWorkspace, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc,
+                             argv);
     }
 
     doProvisioning(rcpLauncherPropertiesArray, rcpInstallPropertiesArray,

@@ -60,10 +60,10 @@ struct Startup {
     wchar_t** argv = nullptr;
     int cargc = 0;  // the effective arguments
     wchar_t** cargv = nullptr;
-    bool bFree = false;             // cargv was allocated by addConfigExtentionsToArg
-    std::vector<wstring> newargs;   // owns the strings cargv points to
-    std::vector<wstring> initialArgs;     // the initial launch's own arguments
-    std::vector<wchar_t*> initialArgv;    // ... as a vector of pointers
+    bool bFree = false;                 // cargv was allocated by addConfigExtentionsToArg
+    std::vector<wstring> newargs;       // owns the strings cargv points to
+    std::vector<wstring> initialArgs;   // the initial launch's own arguments
+    std::vector<wchar_t*> initialArgv;  // ... as a vector of pointers
     std::vector<String> rcpLauncherPropertiesArray;
     std::vector<String> rcpInstallPropertiesArray;
     wstring installDir;
@@ -107,7 +107,7 @@ void readInstallationIdentity(Startup& s) {
     const wchar_t* base = findProperty(RCP_BASE_LOC_PROPERTY, s.rcpLauncherPropertiesArray);
     if (!base)
         fatalErrorExit("RLNCH0050E: rcp.base.location property is missing from %ls",
-                    s.rcp_launcher_properties_file.c_str());
+                       s.rcp_launcher_properties_file.c_str());
     s.coreLocation = base;
     // Only the first occurrence: later ones are the installer's business.
     replaceFirstRcpHome(s.coreLocation, s.installDir);
@@ -136,10 +136,12 @@ void reuseOrResetAreas(Startup& s) {
 // extension marker copied into it when the installation has one.
 void prepareUserSite(Startup& s) {
     const wstring siteLocation = s.workspaceLocation + SITE_LOC;
-    for (const wchar_t* child : {SITE_FEATURES_DIR, SITE_PLUGINS_DIR}) ensureDirectory(nativePath(siteLocation + child));
+    for (const wchar_t* child : {SITE_FEATURES_DIR, SITE_PLUGINS_DIR})
+        ensureDirectory(nativePath(siteLocation + child));
 
     const wstring extLocation = nativePath(s.installDir + SHARED_EXTENSION_LOC);
-    if (exists(extLocation.c_str())) copyFile(extLocation.c_str(), nativePath(siteLocation + ECLIPSE_EXTENSION_FILE).c_str());
+    if (exists(extLocation.c_str()))
+        copyFile(extLocation.c_str(), nativePath(siteLocation + ECLIPSE_EXTENSION_FILE).c_str());
 }
 
 // The startup record (main process only, with the arguments
@@ -206,8 +208,8 @@ void switchToInitialLaunch(Startup& s) {
     int new_argc = static_cast<int>(s.initialArgs.size());
     s.cargc = new_argc;
     s.cargv = s.initialArgv.data();
-    s.bFree = addConfigExtentionsToArg(&s.cargc, &s.cargv, new_argc, s.initialArgv.data(),
-                                       s.rcpLauncherPropertiesArray, s.newargs);
+    s.bFree = addConfigExtentionsToArg(&s.cargc, &s.cargv, new_argc, s.initialArgv.data(), s.rcpLauncherPropertiesArray,
+                                       s.newargs);
 }
 
 // The properties arrays and the effective argument vector.

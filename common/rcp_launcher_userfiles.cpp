@@ -30,7 +30,7 @@ const wchar_t* coreSubFolder() {
 // The launcher properties without which the per-user file cannot be
 // completed (RLNCH0008E).
 constexpr const wchar_t* REQUIRED_LAUNCHER_VALUES[] = {RCP_INSTALL_ID_PROPERTY, JVM_LOCATION, RCP_BASE_LOC_PROPERTY,
-                                                        CONFIGURATION_PROPERTY};
+                                                       CONFIGURATION_PROPERTY};
 
 // Reads the next line of a template; false at the end of the file. The
 // line format swallows the white space after each line, so the scan can meet
@@ -196,7 +196,8 @@ int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propP
     if (missing > 0) {
         // The plain copy stays in place (and the work file beside it).
         fclose(out);
-        fatalErrorExit("RLNCH0008E: Unable to calculate necessary values for user specific rcpinstall.properties file.");
+        fatalErrorExit(
+            "RLNCH0008E: Unable to calculate necessary values for user specific rcpinstall.properties file.");
     }
 
     // The block is expanded as a text without arguments ("%%" gives "%"),

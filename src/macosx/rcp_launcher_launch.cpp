@@ -81,8 +81,8 @@ void launchEclipse(int argc, wchar_t** wargv) {
     if (childPid > 0) populateLockFile(static_cast<int>(childPid));
     unlockLockFile();
 
-    bool wait = findOption(RCPLAUNCHERWAIT, argc, wargv) != -1 ||
-                haveLaunchOption("-console", cargs, static_cast<int>(size));
+    bool wait =
+        findOption(RCPLAUNCHERWAIT, argc, wargv) != -1 || haveLaunchOption("-console", cargs, static_cast<int>(size));
     if (wait && childPid > 0) {
         int status = 0;
         while (waitpid(childPid, &status, 0) == -1 && errno == EINTR) {

@@ -39,15 +39,13 @@ struct PostSessionCommand {
     char parameter[256];
 };
 
-[[noreturn]] void executablePathFailed(int err)
-{
+[[noreturn]] void executablePathFailed(int err) {
     snprintf(tempOutBuffer, sizeof(tempOutBuffer), "RLNCH0184E: Getting executable path failed! errno = %d", err);
     fatalErrorExit(tempOutBuffer);
 }
 
 // The raw path of the running executable as the system reports it.
-std::string systemExecutablePath()
-{
+std::string systemExecutablePath() {
 #if defined(__APPLE__)
     std::vector<char> buffer(EXE_PATH_BUFFER, '\0');
     uint32_t size = static_cast<uint32_t>(buffer.size());
@@ -75,8 +73,7 @@ std::string systemExecutablePath()
 
 // Cuts s at its last '/', dropping the separator and what follows. Returns
 // false (s unchanged) when there is no '/'.
-bool cutAtLastSlash(std::wstring& s)
-{
+bool cutAtLastSlash(std::wstring& s) {
     size_t p = s.rfind(L'/');
     if (p == std::wstring::npos) {
         return false;
@@ -86,8 +83,7 @@ bool cutAtLastSlash(std::wstring& s)
 }
 
 // A /proc entry name that reads as a process id of at least 1.
-bool isProcessNumber(const char* name)
-{
+bool isProcessNumber(const char* name) {
     if (name == nullptr || *name == '\0') {
         return false;
     }
@@ -99,8 +95,7 @@ bool isProcessNumber(const char* name)
 
 }  // namespace
 
-void read_executable_path(std::string& path)
-{
+void read_executable_path(std::string& path) {
     // The launcher's own file does not move while it runs, and resolving it
     // costs a readlink per path component: one successful answer serves the
     // whole run.
@@ -117,8 +112,7 @@ void read_executable_path(std::string& path)
     SvcDebugOutA(path.c_str());
 }
 
-bool readLink(const char* path, std::string& target)
-{
+bool readLink(const char* path, std::string& target) {
     // readlink does not terminate and silently cuts a long target, so the
     // buffer grows until the answer fits with room to spare.
     std::vector<char> buffer(LINK_LIMIT);
@@ -139,8 +133,7 @@ bool readLink(const char* path, std::string& target)
     }
 }
 
-void readsymln(std::string& target, const char* link)
-{
+void readsymln(std::string& target, const char* link) {
     errno = EINVAL;
     if (link == nullptr || !readLink(link, target) || target.size() >= LINK_LIMIT) {
         snprintf(tempOutBuffer, sizeof(tempOutBuffer), "RLNCH0184E: Getting command path failed! errno = %d", errno);
@@ -151,8 +144,7 @@ void readsymln(std::string& target, const char* link)
 // cmd must be null or a String of this program (newString/chartowcs): it is
 // released and replaced by a new String holding the launcher's directory.
 // arg, the program name from the command line, is deliberately not used.
-void findCommand(wchar_t*& cmd, wchar_t* arg)
-{
+void findCommand(wchar_t*& cmd, wchar_t* arg) {
     (void)arg;
     std::string path;
     read_executable_path(path);
@@ -163,8 +155,7 @@ void findCommand(wchar_t*& cmd, wchar_t* arg)
     cmd = copyString(dir.c_str());
 }
 
-wchar_t* getRCPDirectory(int argc, wchar_t** argv)
-{
+wchar_t* getRCPDirectory(int argc, wchar_t** argv) {
     wchar_t* dir = newString(1024);
     findCommand(dir, (argc > 0 && argv != nullptr) ? argv[0] : nullptr);
     if (isDirectory(dir)) {
@@ -174,8 +165,7 @@ wchar_t* getRCPDirectory(int argc, wchar_t** argv)
     return nullptr;
 }
 
-void getInstallDir(std::wstring& installDir, int argc, wchar_t** argv)
-{
+void getInstallDir(std::wstring& installDir, int argc, wchar_t** argv) {
     wchar_t* dir = getRCPDirectory(argc, argv);
     if (dir == nullptr) {
         installDir.clear();
@@ -196,15 +186,13 @@ void getInstallDir(std::wstring& installDir, int argc, wchar_t** argv)
     installDir.clear();
 }
 
-void getLauncherPath(std::wstring& path)
-{
+void getLauncherPath(std::wstring& path) {
     std::string narrowPath;
     read_executable_path(narrowPath);
     chartowstr(narrowPath.c_str(), path);
 }
 
-void getServiceInstallDir(std::wstring& serviceDir, std::wstring& installDir, int argc, wchar_t** argv)
-{
+void getServiceInstallDir(std::wstring& serviceDir, std::wstring& installDir, int argc, wchar_t** argv) {
     wchar_t* found = nullptr;
     findCommand(found, (argc > 0 && argv != nullptr) ? argv[0] : nullptr);
     std::wstring cmd(found != nullptr ? found : L"");
@@ -225,13 +213,9 @@ void getServiceInstallDir(std::wstring& serviceDir, std::wstring& installDir, in
     fatalErrorExit("RLNCH0048E: Unable to locate the directory containing %ls", program);
 }
 
-const wchar_t* getOS()
-{
-    return L"macosx";
-}
+const wchar_t* getOS() { return L"macosx"; }
 
-int shutdown()
-{
+int shutdown() {
     FILE* fp = fopen(CMD_FILE, "w");
     if (fp == nullptr) {
         return 0;
@@ -245,8 +229,7 @@ int shutdown()
     return logoff();
 }
 
-int logoff()
-{
+int logoff() {
     void* handle = dlopen("./lockdown.so", RTLD_LAZY);
     if (handle == nullptr) {
         if (system("killall gnome-session") == -1) {
@@ -269,8 +252,7 @@ int logoff()
     return result;
 }
 
-int findRCP()
-{
+int findRCP() {
     static const char SUFFIX[] = "/eclipse";
     const size_t suffixLength = sizeof(SUFFIX) - 1;
     for (int attempt = 0; attempt < MAX_RETRIES; ++attempt) {

@@ -33,8 +33,7 @@ const size_t COPY_BUFFER_BYTES = 8192;
 // One line of the removal error list. errno is handed in explicitly because it
 // has to be the value the failing call left, not whatever building the line
 // might leave behind.
-void appendError(std::string& errlist, const char* prefix, const std::string& path, int savedErrno)
-{
+void appendError(std::string& errlist, const char* prefix, const std::string& path, int savedErrno) {
     std::string reason;
     errno = savedErrno;
     GetLastErrorMsg(reason);
@@ -45,8 +44,7 @@ void appendError(std::string& errlist, const char* prefix, const std::string& pa
     errlist += "\n";
 }
 
-std::string toNarrow(const wchar_t* path)
-{
+std::string toNarrow(const wchar_t* path) {
     std::string out;
     wcstochar(out, path);
     return out;
@@ -56,8 +54,7 @@ std::string toNarrow(const wchar_t* path)
 // converted once; each converts one item of at most 2024 bytes, which the
 // scratch area holds. Any other format is refused rather than handed to
 // fscanf, which would write through arguments that were never passed.
-const char* lineFormat(const wchar_t* mode)
-{
+const char* lineFormat(const wchar_t* mode) {
     static const std::string propLine = toNarrow(PROP_LINE_FORMAT);
     static const std::string templateLine = toNarrow(LINE_SCAN_FORMAT);
     if (wcscmp(mode, PROP_LINE_FORMAT) == 0) {
@@ -71,8 +68,7 @@ const char* lineFormat(const wchar_t* mode)
 
 }  // namespace
 
-int createDirectory(const wchar_t* dir)
-{
+int createDirectory(const wchar_t* dir) {
     if (dir == nullptr) {
         return 0;
     }
@@ -80,8 +76,7 @@ int createDirectory(const wchar_t* dir)
     return mkdir(path.c_str(), DIRECTORY_MODE) == 0 ? 1 : 0;
 }
 
-int removeDirectoryContents(const std::string& dir, std::string& indent, std::string& errlist)
-{
+int removeDirectoryContents(const std::string& dir, std::string& indent, std::string& errlist) {
     int result = 1;
     DIR* listing = opendir(dir.c_str());
     if (listing == nullptr) {
@@ -123,8 +118,7 @@ int removeDirectoryContents(const std::string& dir, std::string& indent, std::st
     return result;
 }
 
-int removeDirectoryContents(const std::wstring& dir, std::wstring& errlist)
-{
+int removeDirectoryContents(const std::wstring& dir, std::wstring& errlist) {
     std::string narrowDir;
     wstrtocs(narrowDir, dir);
     std::string indent;
@@ -136,8 +130,7 @@ int removeDirectoryContents(const std::wstring& dir, std::wstring& errlist)
     return result;
 }
 
-int removeDirectoryAndContents(const std::wstring& dir, std::wstring& errlist)
-{
+int removeDirectoryAndContents(const std::wstring& dir, std::wstring& errlist) {
     std::string narrowDir;
     wstrtocs(narrowDir, dir);
     std::string indent;
@@ -153,8 +146,7 @@ int removeDirectoryAndContents(const std::wstring& dir, std::wstring& errlist)
     return result;
 }
 
-int copyFile(const wchar_t* origFile, const wchar_t* newFile)
-{
+int copyFile(const wchar_t* origFile, const wchar_t* newFile) {
     const wchar_t* origText = origFile != nullptr ? origFile : L"";
     const wchar_t* newText = newFile != nullptr ? newFile : L"";
     FILE* in = nullptr;
@@ -188,8 +180,7 @@ int copyFile(const wchar_t* origFile, const wchar_t* newFile)
     return 1;
 }
 
-int moveFile(const wchar_t* origFile, const wchar_t* newFile)
-{
+int moveFile(const wchar_t* origFile, const wchar_t* newFile) {
     if (origFile == nullptr || newFile == nullptr) {
         return 0;
     }
@@ -198,8 +189,7 @@ int moveFile(const wchar_t* origFile, const wchar_t* newFile)
     return rename(from.c_str(), to.c_str()) == 0 ? 1 : 0;
 }
 
-int deleteFile(const wchar_t* file)
-{
+int deleteFile(const wchar_t* file) {
     if (file == nullptr) {
         return 0;
     }
@@ -207,8 +197,7 @@ int deleteFile(const wchar_t* file)
     return unlink(path.c_str()) == 0 ? 1 : 0;
 }
 
-int existsA(const char* file)
-{
+int existsA(const char* file) {
     if (file == nullptr) {
         return 0;
     }
@@ -221,8 +210,7 @@ int existsA(const char* file)
     return 1;
 }
 
-int exists(const wchar_t* file)
-{
+int exists(const wchar_t* file) {
     if (file == nullptr) {
         return 0;
     }
@@ -230,8 +218,7 @@ int exists(const wchar_t* file)
     return existsA(path.c_str());
 }
 
-int isDirectory(const wchar_t* file)
-{
+int isDirectory(const wchar_t* file) {
     if (file == nullptr) {
         return 0;
     }
@@ -243,8 +230,7 @@ int isDirectory(const wchar_t* file)
     return S_ISDIR(st.st_mode) ? 1 : 0;
 }
 
-int isExecutable(const wchar_t* file)
-{
+int isExecutable(const wchar_t* file) {
     if (file == nullptr) {
         return 0;
     }
@@ -256,8 +242,7 @@ int isExecutable(const wchar_t* file)
     return (st.st_mode & 0100) != 0 ? 1 : 0;
 }
 
-int readFile(FILE* inX, const wchar_t* mode, std::wstring& inputLineX)
-{
+int readFile(FILE* inX, const wchar_t* mode, std::wstring& inputLineX) {
     // The properties reader calls this once per line; one scratch area serves
     // every call instead of a fresh 200 KB allocation each time.
     static char scratch[READ_SCRATCH_SIZE];
@@ -273,8 +258,7 @@ int readFile(FILE* inX, const wchar_t* mode, std::wstring& inputLineX)
     return result;
 }
 
-void open_wfile(FILE*& inX, const wchar_t* file, const wchar_t* mode)
-{
+void open_wfile(FILE*& inX, const wchar_t* file, const wchar_t* mode) {
     inX = nullptr;
     if (file == nullptr || mode == nullptr) {
         return;
@@ -288,8 +272,7 @@ void open_wfile(FILE*& inX, const wchar_t* file, const wchar_t* mode)
     inX = fp;
 }
 
-int openRegularFile(const char* path, int flags, int mode)
-{
+int openRegularFile(const char* path, int flags, int mode) {
     int fd = open(path, flags | O_NONBLOCK | O_CLOEXEC, mode);
     if (fd < 0) {
         return -1;
@@ -309,8 +292,7 @@ int openRegularFile(const char* path, int flags, int mode)
     return fd;
 }
 
-FILE* createWorkFile(const std::wstring& workPath)
-{
+FILE* createWorkFile(const std::wstring& workPath) {
     std::string path = toNarrow(workPath.c_str());
     unlink(path.c_str());
     int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666);
@@ -329,8 +311,7 @@ FILE* createWorkFile(const std::wstring& workPath)
     return fp;
 }
 
-int finishWorkFile(FILE* fp, const std::wstring& workPath)
-{
+int finishWorkFile(FILE* fp, const std::wstring& workPath) {
     // The error flag stays set after a failed write; the flush and the close
     // report what the buffer still held.
     bool ok = ferror(fp) == 0;
@@ -344,8 +325,7 @@ int finishWorkFile(FILE* fp, const std::wstring& workPath)
     return ok ? 1 : 0;
 }
 
-int commitWorkFile(FILE* fp, const std::wstring& workPath, const std::wstring& finalPath)
-{
+int commitWorkFile(FILE* fp, const std::wstring& workPath, const std::wstring& finalPath) {
     if (!finishWorkFile(fp, workPath)) {
         return 0;
     }
@@ -358,15 +338,13 @@ int commitWorkFile(FILE* fp, const std::wstring& workPath, const std::wstring& f
     return 1;
 }
 
-bool putWide(FILE* fp, const std::wstring& text)
-{
+bool putWide(FILE* fp, const std::wstring& text) {
     std::string bytes;
     wstrtocs(bytes, text);
     return fwrite(bytes.data(), 1, bytes.size(), fp) == bytes.size() && ferror(fp) == 0;
 }
 
-bool readSmallFile(const std::wstring& path, std::string& bytes, size_t limit)
-{
+bool readSmallFile(const std::wstring& path, std::string& bytes, size_t limit) {
     std::string narrowPath = toNarrow(path.c_str());
     int fd = openRegularFile(narrowPath.c_str(), O_RDONLY);
     if (fd < 0) {
@@ -383,16 +361,14 @@ bool readSmallFile(const std::wstring& path, std::string& bytes, size_t limit)
     return got <= limit;
 }
 
-const wchar_t* getUserHome(std::wstring& envHome)
-{
+const wchar_t* getUserHome(std::wstring& envHome) {
     if (getEnv(USER_HOME, envHome) == nullptr) {
         envHome.clear();
     }
     return envHome.c_str();
 }
 
-void sysSleep(int seconds)
-{
+void sysSleep(int seconds) {
     if (seconds <= 0) {
         return;
     }

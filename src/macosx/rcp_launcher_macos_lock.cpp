@@ -19,8 +19,7 @@
 
 #include "rcp_launcher.h"
 
-void createAndOpenLockFile()
-{
+void createAndOpenLockFile() {
     std::string path;
     wcstochar(path, lockFilePath.c_str());
     if (lockFILE != nullptr) {
@@ -52,8 +51,7 @@ void createAndOpenLockFile()
     fwide(lockFILE, -1);
 }
 
-void lockLockFile(const std::wstring& sidFilePath)
-{
+void lockLockFile(const std::wstring& sidFilePath) {
     if (lockFILE == nullptr) {
         fatalErrorExit("RLNCH0054E: Error locating platform lock file");
     }
@@ -74,8 +72,7 @@ void lockLockFile(const std::wstring& sidFilePath)
     }
 }
 
-void populateLockFile(int childPid)
-{
+void populateLockFile(int childPid) {
     if (!isMainProcess() || lockFILE == nullptr) {
         return;
     }
@@ -88,8 +85,7 @@ void populateLockFile(int childPid)
     }
 }
 
-void invalidateLockFile()
-{
+void invalidateLockFile() {
     int written = -1;
     if (lockFILE != nullptr && fseek(lockFILE, 0, SEEK_SET) == 0) {
         written = fprintf(lockFILE, "%s", "              ");
@@ -102,8 +98,7 @@ void invalidateLockFile()
     }
 }
 
-void unlockLockFile()
-{
+void unlockLockFile() {
     if (lockFILE == nullptr) {
         return;
     }
@@ -116,8 +111,7 @@ void unlockLockFile()
 // Returns EOF when the file holds nothing but white space, 0 when the first
 // non-blank is not a number, 1 with *pidOut set otherwise. A number too long
 // for a long is clamped (and names no process).
-int readLockFilePid(long* pidOut)
-{
+int readLockFilePid(long* pidOut) {
     if (lockFILE == nullptr || fseek(lockFILE, 0, SEEK_SET) != 0) {
         return EOF;
     }
@@ -146,8 +140,7 @@ int readLockFilePid(long* pidOut)
 // values address process groups, larger ones do not fit a pid_t - are
 // treated as dead rather than tested, since kill would answer for other
 // processes.
-bool isProcessAlive(long processId)
-{
+bool isProcessAlive(long processId) {
     if (processId <= 0 || processId > static_cast<long>(INT_MAX)) {
         return false;
     }
