@@ -25,7 +25,6 @@ void removeOneTrailingSeparator(wstring& path) {
 unsigned long getTick() { return static_cast<unsigned long>(std::time(nullptr)); }
 
 wchar_t* getTickString(wchar_t* wsticks, size_t size) {
-    if (wsticks == nullptr || size == 0) return wsticks;
     if (swprintf(wsticks, size, L"%lu", getTick()) < 0) wsticks[0] = 0;  // too small: empty, never unterminated
     return wsticks;
 }

@@ -13,7 +13,6 @@ namespace {
 // Shared by isJavaw and replaceJavaExecutableName: the path with its trailing
 // executable name swapped, or false when the path does not end with that name.
 bool swapExecutableName(const wstring& vmString, const wchar_t* from, const wchar_t* to, wstring& swapped) {
-    if (from == nullptr || to == nullptr) return false;
     size_t fromLen = wcslen(from);
     if (vmString.size() < fromLen) return false;
     size_t chgPos = vmString.size() - fromLen;

@@ -38,7 +38,6 @@ void addMainOptionsToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
     // back, a later one is an ordinary argument. A value is consumed even when
     // it lies beyond "-vmargs".
     for (int i = 1; i < vmargsIdx; i++) {
-        if (argv[i] == nullptr) continue;
         if (i == dataIdx) {
             i++;  // written below with the computed location
         } else if (i == configIdx) {
@@ -46,7 +45,7 @@ void addMainOptionsToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
             configIdx = -1;
         } else if (i == plugincustIdx || i == applicationIdx || i == productIdx || i == personalityIdx) {
             addArgToCommandLine(argv[i]);
-            if (i + 1 < argc && argv[i + 1] != nullptr) addArgToCommandLine(argv[i + 1]);
+            if (i + 1 < argc) addArgToCommandLine(argv[i + 1]);
             i++;
         } else if (i == vmIdx) {
             i++;  // the JVM is the launcher's business, not the platform's

@@ -49,7 +49,7 @@ void addVmargsToCommandLine(const wstring& workspaceLocation, std::vector<String
     int vmargsIdx = findOption(VMARGS, argc, argv);
     if (vmargsIdx != -1) {
         for (int i = vmargsIdx + 1; i < argc; i++) {
-            if (argv[i] != nullptr) addArgToCommandLine(argv[i]);
+            addArgToCommandLine(argv[i]);
         }
     }
 

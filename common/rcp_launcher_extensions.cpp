@@ -18,7 +18,6 @@ const wchar_t* const SINGLE_VALUED_OPTIONS[] = {VMARG,          DATAARG, PLUGINC
 
 bool addConfigExtentionsToArg(int* cargc, wchar_t*** cargv, int argc, wchar_t** argv,
                               std::vector<String> rcpLauncherPropertiesArray, std::vector<wstring>& newargs) {
-    if (cargc == nullptr || cargv == nullptr || argv == nullptr) return false;
     const wchar_t* configName = optionValue(CONFIGOPTARG, argc, argv);
     if (configName == nullptr) return false;
     const wstring configOption = configName;
@@ -32,7 +31,7 @@ bool addConfigExtentionsToArg(int* cargc, wchar_t*** cargv, int argc, wchar_t** 
     bool vmargsInArgv = false;
     for (int i = 0; i < argc; ++i) {
         if (i == configOptionIDX || i == configOptionIDX + 1) continue;
-        const wchar_t* arg = argv[i] != nullptr ? argv[i] : L"";
+        const wchar_t* arg = argv[i];
         newargs.push_back(arg);
         // The position in argv minus the two skipped words: right when
         // "-config NAME" came before "-vmargs", two places too early otherwise.

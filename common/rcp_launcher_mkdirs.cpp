@@ -20,9 +20,6 @@ bool isSeparator(wchar_t ch) { return ch == L'/' || ch == L'\\'; }
 // callers that need the directory test for it with isDirectory. A path with
 // no levels at all gives 1.
 int mkdirs(const wchar_t* path) {
-    if (path == nullptr) {
-        return 1;
-    }
     size_t length = wcsnlen(path, MKDIRS_BUFFER_CHARS);
     if (length >= MKDIRS_BUFFER_CHARS) {
         return 0;

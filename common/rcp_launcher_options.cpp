@@ -8,9 +8,8 @@ bool bWaitMode = false;
 bool runningLock = false;
 
 int findOption(const wchar_t* opt, int argc, wchar_t** argv) {
-    if (opt == nullptr || argv == nullptr) return -1;
     for (int i = 1; i < argc; ++i) {
-        if (argv[i] != nullptr && wcscmp(argv[i], opt) == 0) return i;
+        if (wcscmp(argv[i], opt) == 0) return i;
     }
     return -1;
 }

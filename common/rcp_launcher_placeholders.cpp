@@ -227,14 +227,9 @@ void replacePlaceholdersInRcpInstallProp(wstring workspaceLocation, wstring inst
 
 void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wchar_t** argv, wchar_t** cargv,
                                int argc) {
-    if (argv == nullptr || cargv == nullptr) return;
     convertBS2S(workspaceLocation);
     convertBS2S(installDir);
     for (int i = 0; i < argc; ++i) {
-        if (argv[i] == nullptr) {
-            cargv[i] = unchangedArg;
-            continue;
-        }
         wstring arg = argv[i];
         if (replaceStdPlaceholders(workspaceLocation, installDir, arg)) {
             // The old argument is not freed: it belongs to whoever built argv.

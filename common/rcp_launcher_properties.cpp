@@ -208,7 +208,6 @@ void getProperties(const wstring& propFilePath, std::vector<String>& propArray) 
 }
 
 String findProperty(const wchar_t* name, const std::vector<String>& propArray) {
-    if (name == nullptr) return nullptr;
     for (size_t i = 0; i + 1 < propArray.size(); i += 2) {
         if (propArray[i] != nullptr && wcscmp(propArray[i], name) == 0) return propArray[i + 1];
     }
@@ -245,7 +244,6 @@ String* findProperties(const wchar_t* prefix, const std::vector<String>& propArr
 }
 
 void removeDuplicates(std::vector<wstring>& args, const wchar_t* str) {
-    if (str == nullptr) return;
     bool seen = false;
     for (size_t i = 0; i < args.size(); ++i) {
         if (wcscmp(args[i].c_str(), str) != 0) continue;

@@ -36,7 +36,7 @@ void writeStartupArgs(int argc, wchar_t** argv, const wstring& configLocation) {
             // The path as typed may be relative or found through PATH; the
             // record must work from any directory.
             getLauncherPath(value);
-        } else if (argv[i] != nullptr) {
+        } else {
             value = argv[i];
         }
         appendRecordLine(record, ARG_KEY_PREFIX + std::to_wstring(writeNum++), value);

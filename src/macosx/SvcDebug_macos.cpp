@@ -223,24 +223,24 @@ bool enableLogging(const std::wstring& logLocation) { return openLog(logLocation
 bool dumpLogToTempLocation() { return openLog(TEMP_LOG_DIR, true); }
 
 void SvcDebugOutA(const char* fString) {
-    if (!debug || fString == nullptr || strlen(fString) >= MAX_DEBUG_FORMAT) return;
+    if (!debug || strlen(fString) >= MAX_DEBUG_FORMAT) return;
     Output("%s", fString);
 }
 
 void SvcDebugOutA(const char* fString, const char* str) {
-    if (!debug || fString == nullptr || strlen(fString) >= MAX_DEBUG_FORMAT) return;
+    if (!debug || strlen(fString) >= MAX_DEBUG_FORMAT) return;
     std::string text = formatWithSpareArgs(fString, {strArg(str)});
     Output("%s", text.c_str());
 }
 
 void SvcDebugOutA(const char* fString, int status) {
-    if (!debug || fString == nullptr || strlen(fString) >= MAX_DEBUG_FORMAT) return;
+    if (!debug || strlen(fString) >= MAX_DEBUG_FORMAT) return;
     std::string text = formatWithSpareArgs(fString, {intArg(status)});
     Output("%s", text.c_str());
 }
 
 void SvcDebugOutW(const wchar_t* fString, const wchar_t* arg) {
-    if (!debug || fString == nullptr) return;
+    if (!debug) return;
     std::string fmt, narg;
     wcstochar(fmt, fString);
     wcstochar(narg, arg ? arg : L"");

@@ -29,7 +29,6 @@ void addPathToCommandLine(wstring eclipseExePath) {
 }
 
 bool haveLaunchOption(const char* option, char** cargs, int argCount) {
-    if (option == nullptr || cargs == nullptr) return false;
     for (int i = 0; i < argCount; ++i) {
         if (cargs[i] != nullptr && strcmp(cargs[i], option) == 0) return true;
     }

@@ -157,7 +157,7 @@ void findCommand(wchar_t*& cmd, wchar_t* arg) {
 
 wchar_t* getRCPDirectory(int argc, wchar_t** argv) {
     wchar_t* dir = newString(1024);
-    findCommand(dir, (argc > 0 && argv != nullptr) ? argv[0] : nullptr);
+    findCommand(dir, argc > 0 ? argv[0] : nullptr);
     if (isDirectory(dir)) {
         return dir;
     }
@@ -194,7 +194,7 @@ void getLauncherPath(std::wstring& path) {
 
 void getServiceInstallDir(std::wstring& serviceDir, std::wstring& installDir, int argc, wchar_t** argv) {
     wchar_t* found = nullptr;
-    findCommand(found, (argc > 0 && argv != nullptr) ? argv[0] : nullptr);
+    findCommand(found, argc > 0 ? argv[0] : nullptr);
     std::wstring cmd(found != nullptr ? found : L"");
     freeString(found);
     // The service directory is two levels and the installation six levels
@@ -209,7 +209,7 @@ void getServiceInstallDir(std::wstring& serviceDir, std::wstring& installDir, in
             return;
         }
     }
-    const wchar_t* program = (argc > 0 && argv != nullptr && argv[0] != nullptr) ? argv[0] : L"";
+    const wchar_t* program = argc > 0 ? argv[0] : L"";
     fatalErrorExit("RLNCH0048E: Unable to locate the directory containing %ls", program);
 }
 

@@ -39,7 +39,6 @@ void logPreloadVariable() {
 }  // namespace
 
 bool setEnv(const wchar_t* key, const wchar_t* var, bool overwrite) {
-    if (key == nullptr || var == nullptr) return true;
     std::string keyA;
     std::string varA;
     wstrtocs(keyA, key);
@@ -48,7 +47,6 @@ bool setEnv(const wchar_t* key, const wchar_t* var, bool overwrite) {
 }
 
 bool unsetEnv(const wchar_t* key) {
-    if (key == nullptr) return true;
     std::string keyA;
     wstrtocs(keyA, key);
     unsetenv(keyA.c_str());
@@ -105,7 +103,6 @@ void addLdPreloadToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
 }
 
 void setPreload(const wchar_t* ldPreload, const wchar_t* IDString) {
-    if (ldPreload == nullptr) return;
     std::string ldPreloadA;
     wstrtocs(ldPreloadA, ldPreload);
 

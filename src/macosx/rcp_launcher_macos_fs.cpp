@@ -69,9 +69,6 @@ const char* lineFormat(const wchar_t* mode) {
 }  // namespace
 
 int createDirectory(const wchar_t* dir) {
-    if (dir == nullptr) {
-        return 0;
-    }
     std::string path = toNarrow(dir);
     return mkdir(path.c_str(), DIRECTORY_MODE) == 0 ? 1 : 0;
 }
@@ -181,18 +178,12 @@ int copyFile(const wchar_t* origFile, const wchar_t* newFile) {
 }
 
 int moveFile(const wchar_t* origFile, const wchar_t* newFile) {
-    if (origFile == nullptr || newFile == nullptr) {
-        return 0;
-    }
     std::string from = toNarrow(origFile);
     std::string to = toNarrow(newFile);
     return rename(from.c_str(), to.c_str()) == 0 ? 1 : 0;
 }
 
 int deleteFile(const wchar_t* file) {
-    if (file == nullptr) {
-        return 0;
-    }
     std::string path = toNarrow(file);
     return unlink(path.c_str()) == 0 ? 1 : 0;
 }
@@ -260,9 +251,6 @@ int readFile(FILE* inX, const wchar_t* mode, std::wstring& inputLineX) {
 
 void open_wfile(FILE*& inX, const wchar_t* file, const wchar_t* mode) {
     inX = nullptr;
-    if (file == nullptr || mode == nullptr) {
-        return;
-    }
     std::string path = toNarrow(file);
     std::string narrowMode = toNarrow(mode);
     FILE* fp = fopen(path.c_str(), narrowMode.c_str());

@@ -52,9 +52,6 @@ void createAndOpenLockFile() {
 }
 
 void lockLockFile(const std::wstring& sidFilePath) {
-    if (lockFILE == nullptr) {
-        fatalErrorExit("RLNCH0054E: Error locating platform lock file");
-    }
     // Blocks while another launcher of this workspace holds the lock, that is
     // until it has started its child.
     while (flock(fileno(lockFILE), LOCK_EX) != 0) {
@@ -73,35 +70,24 @@ void lockLockFile(const std::wstring& sidFilePath) {
 }
 
 void populateLockFile(int childPid) {
-    if (!isMainProcess() || lockFILE == nullptr) {
+    if (!isMainProcess()) {
         return;
     }
-    int written = -1;
-    if (fseek(lockFILE, 0, SEEK_SET) == 0) {
-        written = fprintf(lockFILE, "%ld          ", static_cast<long>(childPid));
-    }
-    if (fflush(lockFILE) != 0 || written < 0) {
+    const bool written = fseek(lockFILE, 0, SEEK_SET) == 0 &&
+                         fprintf(lockFILE, "%ld          ", static_cast<long>(childPid)) >= 0;
+    if (fflush(lockFILE) != 0 || !written) {
         SvcDebugOutA("RLNCH0051E: Unable to write to platform lock file");
     }
 }
 
 void invalidateLockFile() {
-    int written = -1;
-    if (lockFILE != nullptr && fseek(lockFILE, 0, SEEK_SET) == 0) {
-        written = fprintf(lockFILE, "%s", "              ");
-        if (fflush(lockFILE) != 0) {
-            written = -1;
-        }
-    }
-    if (written < 0) {
+    const bool written = fseek(lockFILE, 0, SEEK_SET) == 0 && fprintf(lockFILE, "%s", "              ") >= 0;
+    if (fflush(lockFILE) != 0 || !written) {
         SvcDebugOutA("RLNCH0052E: Unable to invalidate platform lock file");
     }
 }
 
 void unlockLockFile() {
-    if (lockFILE == nullptr) {
-        return;
-    }
     if (flock(fileno(lockFILE), LOCK_UN) != 0) {
         fatalError("RLNCH0070E: Error unlocking platform lock file. errno=%d", errno);
     }
@@ -112,7 +98,7 @@ void unlockLockFile() {
 // non-blank is not a number, 1 with *pidOut set otherwise. A number too long
 // for a long is clamped (and names no process).
 int readLockFilePid(long* pidOut) {
-    if (lockFILE == nullptr || fseek(lockFILE, 0, SEEK_SET) != 0) {
+    if (fseek(lockFILE, 0, SEEK_SET) != 0) {
         return EOF;
     }
     clearerr(lockFILE);
