@@ -1,8 +1,8 @@
 #!/usr/bin/env bash
 # Builds and runs every test: a normal build with warnings as errors, its
 # end-to-end suite once more with the launcher under valgrind, the same suite
-# under AddressSanitizer + UndefinedBehaviorSanitizer, and short bounded
-# fuzzing runs built with clang.
+# under AddressSanitizer + UndefinedBehaviorSanitizer, short bounded fuzzing
+# runs built with clang, and on Linux a cross-build of the launcher for macOS.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 root=$(pwd)
@@ -45,4 +45,14 @@ elif [ -f "$root/fuzz/CMakeLists.txt" ]; then
     -DRCP_FUZZ=ON >/dev/null
   cmake --build "$root/build-fuzz" -j"$jobs"
   (cd "$root/build-fuzz" && ctest -L fuzz --output-on-failure)
+fi
+
+if [ "$(uname -s)" = Linux ] && [ "$(uname -m)" = x86_64 ]; then
+  # Compiles and links only: nothing here can run a macOS program.
+  echo "=== macOS cross-build (x86_64, arm64) ==="
+  scripts/check-macos.sh
+else
+  # On macOS the builds above are the real thing; the cross toolchain exists
+  # for x86-64 Linux only.
+  echo "=== macOS cross-build skipped ($(uname -s) $(uname -m)) ==="
 fi
