@@ -53,6 +53,10 @@ if [ ${#missing[@]} -gt 0 ]; then
   scripts/install-deps.sh "${missing[@]}" >&2
 fi
 llvm_nm=$(find_llvm_nm)
+if [ -z "$llvm_nm" ]; then
+  echo "check-macos: llvm-nm not found, although the llvm package is installed" >&2
+  exit 1
+fi
 
 # The toolchain is installed into a staging directory that is renamed only
 # when complete, so an interrupted download is never taken for a toolchain.
