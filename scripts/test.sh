@@ -2,8 +2,9 @@
 # Builds and runs every test: a normal build with warnings as errors, its
 # end-to-end suite once more with the launcher under valgrind, the same suite
 # under AddressSanitizer + UndefinedBehaviorSanitizer, short bounded fuzzing
-# runs built with clang, and last the demo, which installs the normal build and
-# checks it on a real Equinox platform.
+# runs built with clang, on Linux a cross-build of the launcher for macOS, and
+# last the demo, which installs the normal build and checks it on a real
+# Equinox platform.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 root=$(pwd)
@@ -46,6 +47,16 @@ elif [ -f "$root/fuzz/CMakeLists.txt" ]; then
     -DRCP_FUZZ=ON >/dev/null
   cmake --build "$root/build-fuzz" -j"$jobs"
   (cd "$root/build-fuzz" && ctest -L fuzz --output-on-failure)
+fi
+
+if [ "$(uname -s)" = Linux ] && [ "$(uname -m)" = x86_64 ]; then
+  # Compiles and links only: nothing here can run a macOS program.
+  echo "=== macOS cross-build (x86_64, arm64) ==="
+  scripts/check-macos.sh
+else
+  # On macOS the builds above are the real thing; the cross toolchain exists
+  # for x86-64 Linux only.
+  echo "=== macOS cross-build skipped ($(uname -s) $(uname -m)) ==="
 fi
 
 if [ "$(uname -s)" = Darwin ]; then

@@ -43,7 +43,7 @@ Entry entryAt(const std::string& path) {
     Entry e;
     struct stat st;
     if (lstat(path.c_str(), &st) != 0) return e;
-    e = {true, st.st_mode & S_IFMT, st.st_uid, ""};
+    e = {true, static_cast<mode_t>(st.st_mode & S_IFMT), st.st_uid, ""};
     char buf[4096];
     ssize_t n = S_ISLNK(st.st_mode) ? readlink(path.c_str(), buf, sizeof buf) : 0;
     if (n > 0) e.content.assign(buf, static_cast<size_t>(n));

@@ -46,7 +46,7 @@ TEST_F(FilesystemTest, Mkdirs) {
     EXPECT_FALSE(pathExists(b + "/long") || pathExists(b + "/huge"));  // nothing made of a refused path
     struct stat st;
     ASSERT_EQ(stat((b + "/a/b").c_str(), &st), 0);
-    EXPECT_EQ(st.st_mode & 0777, 0775u);
+    EXPECT_EQ(st.st_mode & 0777u, 0775u);
 }
 
 TEST_F(FilesystemTest, RemovalAndItsErrorList) {
