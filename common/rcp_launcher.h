@@ -9,7 +9,9 @@
 //  - argc/argv are the launcher's own (or effective) arguments in wide form;
 //    argv[0] is the program and is never matched as an option.
 //  - Failures are not passed up: a condition the launch cannot survive calls
-//    fatalErrorA/fatalErrorW with the exit flag (status 255).
+//    fatalErrorExit (status 255). The common logic reaches the operating
+//    system only through rcp_launcher_os.h.
+// Each section below names the source file that holds it.
 #ifndef RCP_LAUNCHER_H
 #define RCP_LAUNCHER_H
 
@@ -45,7 +47,7 @@ extern long pid;              // process id last read from the lock file
 extern wstring lockFilePath;  // <workspace>/.rcp.lock
 extern FILE* lockFILE;        // the open lock file ("r+")
 
-// ===================== Allocation (rcp_launcher_strings) =====================
+// ===================== Strings and paths (rcp_launcher_strings) ==============
 String newString(unsigned long len);                     // len characters + terminator, empty
 String freeString(String s);                             // frees, returns null
 String initMemString(String str1, const wchar_t* str2);  // wcscat, returns str1
@@ -57,7 +59,7 @@ wstring joinPath(const wstring& dir, const wstring& name);
 // path in the platform's separators.
 wstring nativePath(wstring path);
 
-// ===================== Child command line (rcp_launcher_launch) ==============
+// ===================== Child command line and start (src/macosx/rcp_launcher_launch)
 extern std::vector<wstring> launchArgs;
 // Appends arg; while bRestart is set, "-debug" and "-console" are dropped.
 void addArgToCommandLine(wstring arg, bool handleSpaces = false);
@@ -92,10 +94,6 @@ bool isLockdownConfig();
 
 // ===================== Startup sequence (rcp_launcher_startup) ===============
 void startup(int argc, wchar_t** argv, const std::vector<wstring>& launchArgs);
-// isDirectory, else set userFirstLaunch and mkdirs; RLNCH0010E when that
-// fails. The one way a directory is made: a directory that another launcher
-// made meanwhile counts as made.
-void ensureDirectory(const wstring& dir);
 // <workspace>/logs.
 void getLogLocation(wstring& logLocation, const wstring& workspaceLocation);
 // The workspace and its log directory ensured, the log opened there (else
@@ -133,7 +131,7 @@ bool processFilterKey(wstring& line);  // true: the line belongs to another plat
 // Frees every entry (each is its own allocation) and empties the array.
 void freeProperties(std::vector<String>& propArray);
 
-// ===================== Properties writer (rcp_launcher_properties) ===========
+// ===================== Properties writer (rcp_launcher_properties_writer) ====
 size_t convWcharTo8859_1_Key(const wstring& key, wstring& out);
 size_t convWcharTo8859_1_Value(const wstring& value, wstring& out);
 void convWcharTo8859_1(const wstring& key, const wstring& value, wstring& out);
@@ -163,7 +161,15 @@ bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArra
 // path and main class on its command line, instead of the Eclipse executable.
 bool isServiceConfig();
 
-// ===================== JVM selection (rcp_launcher_cmdline) ==================
+// ===================== The command line in its order (rcp_launcher_cmdline) ==
+// The builders below, called in the order of a provisioning launch, a
+// service configuration or any other configuration, after the placeholders
+// are expanded; the child's environment last.
+void getUserCmdString(const wstring& workspaceLocation, int argc, wchar_t** argv, wstring installDir,
+                      std::vector<String>& rcpInstallPropertiesArray, std::vector<String>& rcpLauncherPropertiesArray,
+                      bool provisioning, bool bRelaunch);
+
+// ===================== JVM, class path, launcher class (rcp_launcher_cmdline_jvm)
 void addVmToCommandLine(std::vector<String>& rcpInstallPropertiesArray, std::vector<String>& rcpLauncherPropertiesArray,
                         int argc, wchar_t** argv);
 bool getJvmPropertyLocation(std::vector<String>& rcpInstallPropertiesArray, const wstring& installDir,
@@ -171,7 +177,6 @@ bool getJvmPropertyLocation(std::vector<String>& rcpInstallPropertiesArray, cons
 bool isJavaw(wstring& vmString, const wchar_t* javawDEF, const wchar_t* javaDEF);
 bool replaceJavaExecutableName(wstring& vmString, const wchar_t* origName, const wchar_t* replacementName);
 
-// ===================== Class path and launcher class (rcp_launcher_cmdline) ==
 void addBaseEclipseToCommandLine(std::vector<String>& rcpInstallPropertiesArray);
 void addStartupToCommandLine(std::vector<String> propArray, int argc, wchar_t** argv);
 void addClasspathToCommandLine(std::vector<String>& rcpInstallPropertiesArray);
@@ -180,7 +185,7 @@ void addUseDaemonToCommandLine();
 // "rcp.base.location" of props; RLNCH0011E when it is missing.
 wstring requireBaseLocation(const std::vector<String>& props);
 
-// ===================== VM arguments and system properties (rcp_launcher_cmdline)
+// ===================== VM arguments and system properties (rcp_launcher_cmdline_vmargs)
 void setArgProperty(wstring& prop, const wchar_t* key, const wchar_t* value);
 void addVmargsToCommandLine(const wstring& workspaceLocation, std::vector<String>& rcpInstallPropertiesArray, int argc,
                             wchar_t** argv);
@@ -189,19 +194,17 @@ void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
                            wstring& installDir);
 void addXargsToCommandLine(std::vector<String>& rcpInstallPropertiesArray);
 
-// ===================== Platform options (rcp_launcher_cmdline) ===============
+// ===================== Platform options (rcp_launcher_cmdline_options) =======
 void addMainOptionsToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
                                  std::vector<String>& rcpLauncherPropertiesArray, int argc, wchar_t** argv,
                                  wstring& installDir);
 
-// ===================== Startup record and locations (rcp_launcher_record) ====
+// ===================== Startup record (rcp_launcher_record) ==================
 void writeStartupArgs(int argc, wchar_t** argv, const wstring& configLocation);
-void getLogLocation(wstring& logLocation, const wstring& workspaceLocation);
-wstring getCoreFileLocation(const wstring& coreLocation, const wchar_t* filename);
-unsigned long getTick();
-wchar_t* getTickString(wchar_t* wsticks, size_t size);
 
 // ===================== Workspace and configuration (rcp_launcher_areas) ======
+unsigned long getTick();
+wchar_t* getTickString(wchar_t* wsticks, size_t size);
 String getInstallID(wstring rcp_launcher_properties_file, std::vector<String>& rcpLauncherPropertiesArray);
 int getWorkspaceLocation(wstring& workspaceLocation, std::vector<String>& rcpInstallPropertiesArray, int argc,
                          wchar_t** argv, wstring& installDir);
@@ -210,6 +213,9 @@ int getConfigurationLocation(wstring& configLocation, std::vector<String>& rcpIn
 bool isOldRcpInstallId(const wstring& launcherInstallID, const wstring& configLocation);
 
 // ===================== Per-user files (rcp_launcher_userfiles) ===============
+// The configuration's own template below <core>/config/<sub-folder>, else
+// the one in <core>.
+wstring getCoreFileLocation(const wstring& coreLocation, const wchar_t* filename);
 wstring createRCPInstallProps(const wstring& workspaceLocation, const wstring& configLocation,
                               const wstring& baseLocation, const wstring& installDir, std::vector<String> propsArray);
 int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propPath, wstring& newPropPath,
@@ -228,14 +234,20 @@ void resetMetaDataDirs(const wstring& workspaceLocation, const wstring& configLo
 void resetWorkspace(const wstring& workspaceLocation, const wstring& configLocation, const wstring& coreLocation);
 void createReusableWorkspace(const wstring& workspaceLocation, const wstring& configLocation);
 
-// ===================== File system, common part (rcp_launcher_mkdirs) ========
+// ===================== Directories (rcp_launcher_mkdirs) ======================
 int mkdirs(const wchar_t* path);
+// isDirectory, else set userFirstLaunch and mkdirs; RLNCH0010E when that
+// fails. The one way a directory is made: a directory that another launcher
+// made meanwhile counts as made.
+void ensureDirectory(const wstring& dir);
 
-// ===================== Provisioning (rcp_launcher_provisioning) ==============
-bool isNewProvisioningLevel(const wchar_t* previous, const wchar_t* current);
+// ===================== "-config" extensions (rcp_launcher_extensions) ========
 // The effective arguments: "-config NAME" replaced by the config.NAME.N values.
 bool addConfigExtentionsToArg(int* cargc, wchar_t*** cargv, int argc, wchar_t** argv,
                               std::vector<String> rcpLauncherPropertiesArray, std::vector<wstring>& newargs);
+
+// ===================== Provisioning and initial launch (rcp_launcher_provisioning)
+bool isNewProvisioningLevel(const wchar_t* previous, const wchar_t* current);
 bool isInitialRequired(std::vector<String> rcpLauncherPropertiesArray, std::vector<String> rcpInstallPropertiesArray);
 void checkForProvisioning(const wstring& workspaceLocation, int argc, wchar_t** argv, const wstring& installDir,
                           std::vector<String>& rcpInstallPropertiesArray,
@@ -245,9 +257,6 @@ void checkForProvisioning(const wstring& workspaceLocation, int argc, wchar_t** 
 void createMUServiceWkspc(wstring& workspaceLocation, const wstring& installDir,
                           std::vector<String>& rcpInstallPropertiesArray,
                           std::vector<String> rcpLauncherPropertiesArray, int argc, wchar_t** argv);
-void getUserCmdString(const wstring& workspaceLocation, int argc, wchar_t** argv, wstring installDir,
-                      std::vector<String>& rcpInstallPropertiesArray, std::vector<String>& rcpLauncherPropertiesArray,
-                      bool provisioning, bool bRelaunch);
 // "-initMUService": the service's own area, log and lock, then its command line.
 void startupMUService(int argc, wchar_t** argv);
 

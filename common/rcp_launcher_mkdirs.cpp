@@ -1,4 +1,6 @@
-// Creating a whole directory path, one level at a time.
+// Making directories: a whole path one level at a time (mkdirs), and the
+// one way the launcher makes a directory it needs (ensureDirectory).
+#include <cerrno>
 #include <cwchar>
 #include <string>
 
@@ -43,4 +45,18 @@ int mkdirs(const wchar_t* path) {
         accumulated += L"/";
     }
     return result;
+}
+
+void ensureDirectory(const wstring& dir) {
+    if (isDirectory(dir.c_str())) return;
+    userFirstLaunch = true;
+    if (mkdirs(dir.c_str())) return;
+    // The workspace and log directories come before the platform lock, so
+    // another launcher of the same user may have created the directory
+    // between the test above and mkdirs (whose last mkdir then fails with
+    // EEXIST). What counts is that the directory is there now.
+    const int mkdirsErrno = errno;
+    if (isDirectory(dir.c_str())) return;
+    errno = mkdirsErrno;  // the error line reports why mkdirs failed
+    fatalErrorExit("RLNCH0010E: Unable to create %ls directory.", dir.c_str());
 }

@@ -22,20 +22,6 @@
 // launch; it only ever goes from false to true.
 bool userFirstLaunch = false;
 
-void ensureDirectory(const wstring& dir) {
-    if (isDirectory(dir.c_str())) return;
-    userFirstLaunch = true;
-    if (mkdirs(dir.c_str())) return;
-    // The workspace and log directories come before the platform lock, so
-    // another launcher of the same user may have created the directory
-    // between the test above and mkdirs (whose last mkdir then fails with
-    // EEXIST). What counts is that the directory is there now.
-    const int mkdirsErrno = errno;
-    if (isDirectory(dir.c_str())) return;
-    errno = mkdirsErrno;  // the error line reports why mkdirs failed
-    fatalErrorExit("RLNCH0010E: Unable to create %ls directory.", dir.c_str());
-}
-
 void getLogLocation(wstring& logLocation, const wstring& workspaceLocation) {
     logLocation = joinPath(workspaceLocation, LOG_DIR);
 }
