@@ -33,9 +33,7 @@ String getInstallID(wstring rcp_launcher_properties_file, std::vector<String>& r
     String installID = findProperty(RCP_INSTALL_ID_PROPERTY, rcpLauncherPropertiesArray);
     if (installID != nullptr) return installID;
 
-    if (eConfig != userpb) {
-        fatalErrorExit("RLNCH0016E: rcp.install.id is required for this configuration!");
-    }
+    if (eConfig != userpb) fatalErrorExit("RLNCH0016E: rcp.install.id is required for this configuration!");
 
     // A package-builder installation names itself on its first launch; the
     // array keeps its key/value pairing and owns both new strings.
@@ -51,18 +49,15 @@ String getInstallID(wstring rcp_launcher_properties_file, std::vector<String>& r
     // last line lacks one gets the entry joined to that line.
     FILE* fp = nullptr;
     open_wfile(fp, rcp_launcher_properties_file.c_str(), L"a+");
-    if (fp == nullptr) {
+    if (fp == nullptr)
         fatalErrorExit("RLNCH0017E: Could not open %ls to append rcp.install.id!",
                        rcp_launcher_properties_file.c_str());
-    }
     const wstring line = wstring(RCP_INSTALL_ID_PROPERTY) + EQUALS_CHAR + installID + NEWLINE;
     // The line is formatted as a text without arguments, never handed to
     // printf as a format.
     const bool written = fputws(formatWithoutArgs(line).c_str(), fp) >= 0 && fflush(fp) == 0;
     fclose(fp);
-    if (!written) {
-        fatalErrorExit("RLNCH0018E: Error while writing to %ls file.", rcp_launcher_properties_file.c_str());
-    }
+    if (!written) fatalErrorExit("RLNCH0018E: Error while writing to %ls file.", rcp_launcher_properties_file.c_str());
     return installID;
 }
 
@@ -87,22 +82,17 @@ int getWorkspaceLocation(wstring& workspaceLocation, std::vector<String>& rcpIns
     String rcpData = findProperty(RCP_DATA_PROPERTY, rcpInstallPropertiesArray);
     if (rcpData != nullptr) {
         wstring expanded = rcpData;
-        if (!replaceUserPlaceholders(expanded, rcpInstallPropertiesArray)) {
+        if (!replaceUserPlaceholders(expanded, rcpInstallPropertiesArray))
             fatalErrorExit("RLNCH0099E: rcp.data property is invalid (%ls)", expanded.c_str());
-        }
         removeOneTrailingSeparator(expanded);
         workspaceLocation = expanded;
         return 1;
     }
 
     String installID = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
-    if (installID == nullptr) {
-        fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
-    }
+    if (installID == nullptr) fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
     wstring userName;
-    if (getEnv(USER_IN_ENV, userName) == nullptr) {
-        fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
-    }
+    if (getEnv(USER_IN_ENV, userName) == nullptr) fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
     wstring home;
     getUserHome(home);
     workspaceLocation = home + USER_WORKSPACE_MIDDLE + installID + L"/" + userName;

@@ -27,9 +27,8 @@ bool swapExecutableName(const wstring& vmString, const wchar_t* from, const wcha
 // The base plug-in directory; every caller needs it, so its absence is fatal.
 wstring requireBaseLocation(const std::vector<String>& props) {
     String baseLoc = findProperty(RCP_BASE_LOC_PROPERTY, props);
-    if (baseLoc == nullptr) {
+    if (baseLoc == nullptr)
         fatalErrorExit("RLNCH0011E: Unable to determine RCP Base Plugin location. If the problem persists, reinstall.");
-    }
     return wstring(baseLoc);
 }
 
@@ -87,9 +86,8 @@ bool replaceJavaExecutableName(wstring& vmString, const wchar_t* origName, const
 
 void addBaseEclipseToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
     wstring baseLocEclipse = requireBaseLocation(rcpInstallPropertiesArray) + BASE_ECLIPSE_PATH;
-    if (isExecutable(baseLocEclipse.c_str()) != 1) {
+    if (isExecutable(baseLocEclipse.c_str()) != 1)
         fatalErrorExit("RLNCH0007E: %ls is not executable or does not exist.", baseLocEclipse.c_str());
-    }
     addPathToCommandLine(baseLocEclipse);
 }
 

@@ -56,9 +56,8 @@ void addMainOptionsToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
         }
     }
 
-    if (findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray) == nullptr) {
+    if (findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray) == nullptr)
         fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
-    }
 
     wstring location;
     getWorkspaceLocation(location, rcpInstallPropertiesArray, argc, argv, installDir);

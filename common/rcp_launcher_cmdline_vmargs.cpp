@@ -94,16 +94,13 @@ void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
     }
 
     String IDString = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
-    if (IDString == nullptr) {
-        fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
-    }
+    if (IDString == nullptr) fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
     setArgProperty(commandArg, D_RCP_INSTALL_ID_PROP, IDString);
     addArgToCommandLine(commandArg);
 
     const wchar_t* configName = configurationName();
-    if (configName == nullptr) {
+    if (configName == nullptr)
         fatalErrorExit("RLNCH0025E: The platform rcp.install.id must be provided for this configuration!");
-    }
     setArgProperty(commandArg, D_CONFIG, configName);
     addArgToCommandLine(commandArg);
 

@@ -71,9 +71,7 @@ bool addConfigExtentionsToArg(int* cargc, wchar_t*** cargv, int argc, wchar_t** 
 
     const size_t count = newargs.size();
     wchar_t** args = static_cast<wchar_t**>(malloc((count == 0 ? 1 : count) * sizeof(wchar_t*)));
-    if (args == nullptr) {
-        fatalErrorExit("RLNCH0004E: malloc failed!");
-    }
+    if (args == nullptr) fatalErrorExit("RLNCH0004E: malloc failed!");
     for (size_t i = 0; i < count; ++i) args[i] = &newargs[i][0];
     *cargc = static_cast<int>(count);
     *cargv = args;

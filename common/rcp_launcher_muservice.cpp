@@ -8,7 +8,6 @@
 
 #include "rcp_launcher.h"
 
-
 void createMUServiceWkspc(wstring& workspaceLocation, const wstring& installDir,
                           std::vector<String>& rcpInstallPropertiesArray,
                           std::vector<String> rcpLauncherPropertiesArray, int argc, wchar_t** argv) {

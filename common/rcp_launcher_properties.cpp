@@ -130,9 +130,7 @@ bool processFilterKey(wstring& line) {
 void getProperties(const wstring& propFilePath, std::vector<String>& propArray) {
     FILE* fp = nullptr;
     open_file(fp, propFilePath.c_str(), L"r");
-    if (fp == nullptr) {
-        fatalErrorExit("RLNCH0014E: Unable to load %ls file!", propFilePath.c_str());
-    }
+    if (fp == nullptr) fatalErrorExit("RLNCH0014E: Unable to load %ls file!", propFilePath.c_str());
     fseek(fp, 0, SEEK_SET);
 
     // Reused for every line: reading stays linear in the file's size.
@@ -217,9 +215,7 @@ String findProperty(const wchar_t* name, const std::vector<String>& propArray) {
 String* findProperties(const wchar_t* prefix, const std::vector<String>& propArray) {
     size_t capacity = 10;
     String* result = static_cast<String*>(malloc((capacity + 1) * sizeof(String)));
-    if (result == nullptr) {
-        fatalErrorExit("RLNCH0046E: findProperties malloc for property strings failed!");
-    }
+    if (result == nullptr) fatalErrorExit("RLNCH0046E: findProperties malloc for property strings failed!");
     const size_t prefixLen = prefix ? wcslen(prefix) : 0;
     size_t count = 0;
     for (size_t i = 0; i + 1 < propArray.size(); i += 2) {

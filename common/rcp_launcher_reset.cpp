@@ -69,9 +69,8 @@ void handleCopy(const wstring& dstdir, const wstring& dstname, const wstring& sr
 
     if (exists(dst.c_str())) {
         if (!isDirectory(dst.c_str())) {
-            if (!deleteFile(dst.c_str())) {
+            if (!deleteFile(dst.c_str()))
                 fatalErrorExit("RLNCH0111E: Can't delete old copy of file '%ls'", dst.c_str());
-            }
         } else {
             removeTreeOrFail(dst,
                              "\nRLNCH0083E begin: Error removing old directory\n%ls\n"
@@ -81,13 +80,9 @@ void handleCopy(const wstring& dstdir, const wstring& dstname, const wstring& sr
     }
 
     if (bRemoveSrc) {
-        if (!moveFile(src.c_str(), dst.c_str())) {
-            fatalErrorExit("RLNCH0112E: Can't move file/dir  '%ls'", src.c_str());
-        }
+        if (!moveFile(src.c_str(), dst.c_str())) fatalErrorExit("RLNCH0112E: Can't move file/dir  '%ls'", src.c_str());
     } else {
-        if (!copyFile(src.c_str(), dst.c_str())) {
-            fatalErrorExit("RLNCH0113E: Can't copy file  '%ls'", src.c_str());
-        }
+        if (!copyFile(src.c_str(), dst.c_str())) fatalErrorExit("RLNCH0113E: Can't copy file  '%ls'", src.c_str());
     }
 }
 
@@ -105,9 +100,7 @@ void resetMetaDataDirs(const wstring& workspaceLocation, const wstring& configLo
     wstring propsPath = joinPath(configLocation, INSTALL_PROPS);
     if (!exists(propsPath.c_str())) {
         propsPath = getCoreFileLocation(coreLocation, INSTALL_PROPS);
-        if (!exists(propsPath.c_str())) {
-            fatalErrorExit("RLNCH0106E: Unable to locate %ls file.", propsPath.c_str());
-        }
+        if (!exists(propsPath.c_str())) fatalErrorExit("RLNCH0106E: Unable to locate %ls file.", propsPath.c_str());
     }
 
     std::vector<String> props;

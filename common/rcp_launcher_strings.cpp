@@ -11,9 +11,7 @@ namespace {
 // Room for len characters and the terminator, already a valid empty string.
 String allocString(unsigned long len, const char* failureMessage) {
     String s = static_cast<String>(malloc((len + 1) * sizeof(wchar_t)));
-    if (s == nullptr) {
-        fatalErrorExit(failureMessage);
-    }
+    if (s == nullptr) fatalErrorExit(failureMessage);
     s[0] = 0;
     return s;
 }

@@ -99,9 +99,8 @@ wstring createRCPInstallProps(const wstring& workspaceLocation, const wstring& c
     // would keep and fail on (no base location, no JVM).
     const wstring basePath = getCoreFileLocation(baseLocation, INSTALL_PROPS);
     const wstring copyPath = propPath + BASE_COPY_SUFFIX;
-    if (!copyFile(basePath.c_str(), copyPath.c_str())) {
+    if (!copyFile(basePath.c_str(), copyPath.c_str()))
         fatalErrorExit("RLNCH0022E: Unable to copy rcpinstall.properties to the user directory.");
-    }
 
     // Without the required values the launch ends while the copy is
     // completed; the plain copy is then meant to stay under the per-user

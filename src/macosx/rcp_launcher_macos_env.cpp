@@ -96,9 +96,7 @@ void addLdPreloadToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
     String ldPreload = findProperty(LD_PRELOAD, rcpInstallPropertiesArray);
     if (ldPreload == nullptr) return;
     String IDString = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
-    if (IDString == nullptr) {
-        fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
-    }
+    if (IDString == nullptr) fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
     setPreload(ldPreload, IDString);
 }
 
@@ -123,16 +121,13 @@ void setPreload(const wchar_t* ldPreload, const wchar_t* IDString) {
     }
 
     size_t filenamePos = ldPreloadA.rfind('/');
-    if (filenamePos == std::string::npos) {
+    if (filenamePos == std::string::npos)
         fatalErrorExit("RLNCH0189E: Couldn't find filename for library.preload property");
-    }
     std::string preloadName = ldPreloadA.substr(filenamePos + 1);
     SvcDebugOutA("setPreload():library name = %s", preloadName.c_str());
 
     const char* userName = getenv(USER_IN_ENV_STRINGA);
-    if (userName == nullptr) {
-        fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
-    }
+    if (userName == nullptr) fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
 
     std::string linkPath = std::string(TEMPDIR_STRINGA) + "/" + TEMPPREFIX_STRINGA + DOT_CHARA + userName + DOT_CHARA +
                            IDStringA + DOT_CHARA + preloadName;

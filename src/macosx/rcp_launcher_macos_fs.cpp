@@ -148,9 +148,7 @@ int copyFile(const wchar_t* origFile, const wchar_t* newFile) {
     const wchar_t* newText = newFile != nullptr ? newFile : L"";
     FILE* in = nullptr;
     open_file(in, origText, L"r");
-    if (in == nullptr) {
-        fatalErrorExit("RLNCH0190E: Unable to open source file %ls to be copied", origText);
-    }
+    if (in == nullptr) fatalErrorExit("RLNCH0190E: Unable to open source file %ls to be copied", origText);
     // Bytes, not text: a copy must never fail because the file is not in
     // the locale's encoding (a launch from the Finder has no LANG at all).
     const std::wstring work = std::wstring(newText) + WORK_FILE_SUFFIX;
@@ -171,9 +169,7 @@ int copyFile(const wchar_t* origFile, const wchar_t* newFile) {
         finishWorkFile(out, work);
         fatalErrorExit("RLNCH0193E: Did not encounter EOF while copying file contents");
     }
-    if (!commitWorkFile(out, work, newText)) {
-        fatalErrorExit("RLNCH0192E: Encountered error copying file contents");
-    }
+    if (!commitWorkFile(out, work, newText)) fatalErrorExit("RLNCH0192E: Encountered error copying file contents");
     return 1;
 }
 

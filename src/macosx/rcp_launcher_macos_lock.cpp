@@ -45,9 +45,7 @@ void createAndOpenLockFile() {
             close(fd);
         }
     }
-    if (lockFILE == nullptr) {
-        fatalErrorExit("RLNCH0054E: Error locating platform lock file");
-    }
+    if (lockFILE == nullptr) fatalErrorExit("RLNCH0054E: Error locating platform lock file");
     fwide(lockFILE, -1);
 }
 
@@ -73,8 +71,8 @@ void populateLockFile(int childPid) {
     if (!isMainProcess()) {
         return;
     }
-    const bool written = fseek(lockFILE, 0, SEEK_SET) == 0 &&
-                         fprintf(lockFILE, "%ld          ", static_cast<long>(childPid)) >= 0;
+    const bool written =
+        fseek(lockFILE, 0, SEEK_SET) == 0 && fprintf(lockFILE, "%ld          ", static_cast<long>(childPid)) >= 0;
     if (fflush(lockFILE) != 0 || !written) {
         SvcDebugOutA("RLNCH0051E: Unable to write to platform lock file");
     }

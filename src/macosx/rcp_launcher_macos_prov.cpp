@@ -21,9 +21,7 @@ void doProvisioning(std::vector<String>& /*launcherPropsArray*/, std::vector<Str
         std::string argA;
         wstrtocs(argA, arg);
         char* copy = strdup(argA.c_str());
-        if (copy == nullptr) {
-            fatalErrorExit("RLNCH0004E: malloc failed!");
-        }
+        if (copy == nullptr) fatalErrorExit("RLNCH0004E: malloc failed!");
         cargs.push_back(copy);
         SvcDebugOutA("%s", copy);
     }
