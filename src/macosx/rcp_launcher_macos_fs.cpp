@@ -115,32 +115,29 @@ int removeDirectoryContents(const std::string& dir, std::string& indent, std::st
     return result;
 }
 
-int removeDirectoryContents(const std::wstring& dir, std::wstring& errlist) {
-    std::string narrowDir;
-    wstrtocs(narrowDir, dir);
-    std::string indent;
-    std::string narrowList;
-    int result = removeDirectoryContents(narrowDir, indent, narrowList);
-    if (!result) {
-        chartowstr(narrowList.c_str(), errlist);
-    }
-    return result;
-}
+namespace {
 
-int removeDirectoryAndContents(const std::wstring& dir, std::wstring& errlist) {
-    std::string narrowDir;
-    wstrtocs(narrowDir, dir);
+// The wide removers: the narrow one's list replaces the caller's only on
+// failure. With the top, dir itself goes too once everything below it has.
+int removeTree(const std::wstring& dir, std::wstring& errlist, bool withTop) {
+    const std::string narrowDir = toNarrow(dir.c_str());
     std::string indent;
     std::string narrowList;
     int result = removeDirectoryContents(narrowDir, indent, narrowList);
-    if (result && rmdir(narrowDir.c_str()) != 0) {
+    if (withTop && result && rmdir(narrowDir.c_str()) != 0) {
         appendError(narrowList, "Can't delete dir ", narrowDir, errno);
         result = 0;
     }
-    if (!result) {
-        chartowstr(narrowList.c_str(), errlist);
-    }
+    if (!result) chartowstr(narrowList.c_str(), errlist);
     return result;
+}
+
+}  // namespace
+
+int removeDirectoryContents(const std::wstring& dir, std::wstring& errlist) { return removeTree(dir, errlist, false); }
+
+int removeDirectoryAndContents(const std::wstring& dir, std::wstring& errlist) {
+    return removeTree(dir, errlist, true);
 }
 
 int copyFile(const wchar_t* origFile, const wchar_t* newFile) {
