@@ -24,12 +24,9 @@
 
 namespace {
 
-// The executable path buffer: 1024 bytes of path plus the terminator.
-const size_t EXE_PATH_BUFFER = 1025;
-// readsymln accepts targets shorter than this.
+// readsymln accepts targets shorter than this, the first buffer of readLink.
 const size_t LINK_LIMIT = 1024;
-// Longest executable path accepted from the system when the first buffer is
-// too small.
+// The longest executable path or link target accepted from the system.
 const size_t EXE_PATH_LIMIT = 65536;
 
 // The record written to the session command file; both fields are
@@ -47,7 +44,8 @@ struct PostSessionCommand {
 // The raw path of the running executable as the system reports it.
 std::string systemExecutablePath() {
 #if defined(__APPLE__)
-    std::vector<char> buffer(EXE_PATH_BUFFER, '\0');
+    // 1024 bytes of path plus the terminator at first.
+    std::vector<char> buffer(1025, '\0');
     uint32_t size = static_cast<uint32_t>(buffer.size());
     if (_NSGetExecutablePath(buffer.data(), &size) != 0) {
         // The buffer was too small; size now holds what is needed.
