@@ -20,15 +20,11 @@ using Strings = std::vector<std::wstring>;
 using Pairs = std::vector<std::pair<std::wstring, std::wstring>>;
 
 // The locale of a launch, an empty log queue and no debug output.
-inline void resetState(installCfg cfg = undefined, bool mainProcess = true) {
+inline void resetState(installCfg cfg = undefined) {
     setlocale(LC_CTYPE, "C.UTF-8");
     resetLoggingForTest();
     setDebug(false);
-    launchArgs.clear();
-    bRestart = bWaitMode = userFirstLaunch = false;
     eConfig = cfg;
-    setMainProcess(mainProcess);
-    pid = 0;
 }
 
 // ASCII test text (paths, messages) as wide text.
@@ -60,14 +56,6 @@ inline void expectFatal(const std::vector<Fatal>& cases) {
         EXPECT_EXIT((enableLogging(W(dir.path())), run()), ::testing::ExitedWithCode(255), "") << message;
         const std::string log = readText(dir.sub("rcplauncher.log"));
         EXPECT_NE(log.find(message), std::string::npos) << message << " not in:\n" << log;
-    }
-}
-
-// Owned pairs added to a PropArray (until every test uses Props).
-inline void addProps(PropArray& props, const std::vector<std::pair<std::wstring, std::wstring>>& pairs) {
-    for (const auto& p : pairs) {
-        props.v().push_back(copyString(p.first.c_str()));
-        props.v().push_back(copyString(p.second.c_str()));
     }
 }
 
