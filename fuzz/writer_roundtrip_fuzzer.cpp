@@ -1,53 +1,46 @@
-// A value escaped for a properties file reads back as written, up to what
-// the reader's grammar takes away on purpose: separators and blanks before
-// the value, blanks after it, and everything from a NUL on.
+// Arbitrary arguments through the startup record (args.properties), which the
+// writer escapes and the platform restarts the launcher from: each line is
+// printable ASCII, and the properties reader gives back arg0 as the
+// launcher's own path, every argument but the first "-restart" and the first
+// "-resetconfig" as it was typed, and their count. As typed means for every
+// character up to U+FFFF, up to what the reader's grammar takes away on
+// purpose: separators and blanks before a value, blanks after it.
 //
-// Input: UTF-16LE code units (every character up to U+FFFF).
-#include <cstdint>
-#include <cstring>
-#include <cwchar>
+// Input: UTF-16LE code units; a U+0000 unit separates two arguments.
+#include <algorithm>
 
 #include "fuzz_common.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    rcpfuzz::resetLog(false);
-
-    const std::wstring key = (size % 2) ? L"a.b.c" : L"k";
-    std::wstring value;
-    std::wstring line;
-    convWcharTo8859_1(key, L"", line);
-    const size_t prefix = line.length();
-    for (size_t i = 0; i + 1 < size; i += 2) {
-        const wchar_t c = static_cast<wchar_t>(data[i] | (data[i + 1] << 8));
-        std::wstring escaped;
-        convWcharTo8859_1_Value(std::wstring(1, c), escaped);
-        if (line.length() + escaped.length() > rcpfuzz::MAX_LINE) break;
-        line += escaped;
-        value += c;
+    resetLoggingForTest();
+    std::vector<std::wstring> args = {L"", L""}, expected;  // expected: key, value, ...
+    getLauncherPath(args[0]);
+    for (size_t i = 0; i + 1 < size && args.size() <= 64; i += 2) {
+        if (data[i] == 0 && data[i + 1] == 0)
+            args.emplace_back();
+        else
+            args.back() += static_cast<wchar_t>(data[i] | (data[i + 1] << 8));
     }
-    {
-        // Escaping the whole value gives the same text as piece by piece.
-        std::wstring whole;
-        FUZZ_CHECK(convWcharTo8859_1_Value(value, whole) == value.length());
-        FUZZ_CHECK(prefix + whole.length() == line.length() && line.compare(prefix, std::wstring::npos, whole) == 0);
+    std::vector<wchar_t*> argv;
+    for (std::wstring& a : args) argv.push_back(&a[0]);
+    const int argc = static_cast<int>(args.size());
+    const int restart = findOption(L"-restart", argc, &argv[0]), reset = findOption(L"-resetconfig", argc, &argv[0]);
+    bool linesFit = true;  // the reader cuts lines at 2024 bytes: only a record of shorter ones reads back unchanged
+    for (int i = 0; i < argc; i++) {
+        if (i == restart || i == reset) continue;
+        const std::wstring key = L"arg" + std::to_wstring(expected.size() / 2), &value = args[static_cast<size_t>(i)];
+        std::wstring line;
+        convWcharTo8859_1(key, value, line);
+        linesFit = linesFit && line.length() <= 2024;
+        FUZZ_CHECK(std::all_of(line.begin(), line.end(), [](wchar_t c) { return c >= 0x20 && c <= 0x7e; }));
+        const size_t first = std::min(value.find_first_not_of(L" =:"), value.length());
+        expected.insert(expected.end(), {key, value.substr(first, value.find_last_not_of(L' ') + 1 - first)});
     }
-
-    std::string text;
-    for (wchar_t c : line) {
-        FUZZ_CHECK(c >= 0x20 && c <= 0x7e);  // printable ASCII only
-        text += static_cast<char>(c);
-    }
-    text += "\nnext=1\n";
-    rcpfuzz::writeScratch(text.data(), text.size());
-
+    expected.insert(expected.end(), {L"argc", std::to_wstring(expected.size() / 2)});
+    writeStartupArgs(argc, argv.data(), L".");
     std::vector<String> props;
-    std::wstring path;
-    chartowstr(rcpfuzz::scratchFile().c_str(), path);
-    getProperties(path, props);
-    FUZZ_CHECK(props.size() == 4);
-    FUZZ_CHECK(key == props[0]);
-    FUZZ_CHECK(rcpfuzz::expectedReadBack(value) == props[1]);
-    FUZZ_CHECK(wcscmp(props[2], L"next") == 0 && wcscmp(props[3], L"1") == 0);
+    getProperties(L"args.properties", props);
+    FUZZ_CHECK(!linesFit || std::vector<std::wstring>(props.begin(), props.end()) == expected);
     freeProperties(props);
     return 0;
 }

@@ -1,70 +1,83 @@
-// Small helpers shared by the unit tests: a throw-away directory, whole-file
-// reads and writes, and wide argument vectors.
+// Small file-system helpers shared by the unit and the end-to-end tests: a
+// throw-away directory and whole-file reads and writes.
 #ifndef RCP_TEST_UTIL_H
 #define RCP_TEST_UTIL_H
 
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <stdexcept>
 #include <string>
-#include <vector>
 
 namespace rcptest {
+
+// Links are not followed.
+inline bool pathExists(const std::string& path) {
+    struct stat st;
+    return lstat(path.c_str(), &st) == 0;
+}
+
+inline bool isDir(const std::string& path) {
+    struct stat st;
+    return lstat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
+}
+
+// Every missing level, mode 0755.
+inline void makeDirs(const std::string& path) {
+    for (size_t slash = path.find('/', 1); slash != std::string::npos; slash = path.find('/', slash + 1))
+        mkdir(path.substr(0, slash).c_str(), 0755);
+    mkdir(path.c_str(), 0755);
+}
+
+// A file, or a directory with everything below it, read-only ones included.
+inline void removeTree(const std::string& path) {
+    if (!isDir(path)) {
+        unlink(path.c_str());
+        return;
+    }
+    chmod(path.c_str(), 0700);
+    std::error_code ec;
+    for (const auto& entry : std::filesystem::directory_iterator(path, ec)) removeTree(entry.path());
+    rmdir(path.c_str());
+}
+
+// Writes text to path (creating parent directories), mode 0644 unless given.
+inline void writeText(const std::string& path, const std::string& text, int mode = 0644) {
+    const size_t slash = path.rfind('/');
+    if (slash != std::string::npos && slash > 0) makeDirs(path.substr(0, slash));
+    unlink(path.c_str());
+    std::ofstream out(path, std::ios::binary);
+    if (!(out << text << std::flush)) throw std::runtime_error("cannot write " + path);
+    chmod(path.c_str(), static_cast<mode_t>(mode));
+}
+
+// The whole file, or "" when it cannot be read.
+inline std::string readText(const std::string& path) {
+    std::ostringstream text;
+    text << std::ifstream(path, std::ios::binary).rdbuf();
+    return text.str();
+}
 
 // A fresh directory under $TMPDIR (or /tmp), removed with everything in it
 // when the object goes out of scope.
 class TempDir {
 public:
-    TempDir();
-    ~TempDir();
+    TempDir() {
+        const char* base = getenv("TMPDIR");
+        path_ = std::string(base && *base ? base : "/tmp") + "/rcptest.XXXXXX";
+        if (!mkdtemp(&path_[0])) throw std::runtime_error("mkdtemp failed");
+    }
+    ~TempDir() { removeTree(path_); }
     TempDir(const TempDir&) = delete;
-    TempDir& operator=(const TempDir&) = delete;
     const std::string& path() const { return path_; }
-    std::wstring wpath() const;
-    // path() + "/" + rel
-    std::string sub(const std::string& rel) const;
-    std::wstring wsub(const std::string& rel) const;
+    std::string sub(const std::string& rel) const { return path_ + "/" + rel; }
 
 private:
     std::string path_;
-};
-
-// Writes text to path (creating parent directories), mode 0644 unless given.
-void writeText(const std::string& path, const std::string& text, int mode = 0644);
-// The whole file, or "" when it cannot be read.
-std::string readText(const std::string& path);
-bool pathExists(const std::string& path);
-bool isDir(const std::string& path);
-void makeDirs(const std::string& path);
-void removeTree(const std::string& path);
-std::wstring widen(const std::string& s);    // ASCII/UTF-8 test text to wide
-std::string narrow(const std::wstring& s);
-
-// Owns a wide argument vector for functions that take (argc, wchar_t** argv).
-class WArgs {
-public:
-    WArgs(std::initializer_list<std::wstring> args);
-    explicit WArgs(const std::vector<std::wstring>& args);
-    int argc() const { return static_cast<int>(ptrs_.size()) - 1; }
-    wchar_t** argv() { return ptrs_.data(); }
-
-private:
-    void build();
-    std::vector<std::wstring> args_;
-    std::vector<std::vector<wchar_t>> storage_;
-    std::vector<wchar_t*> ptrs_;  // closed by a null pointer
-};
-
-// Builds a properties array (owned Strings) from key/value pairs; freed by
-// the destructor.
-class PropArray {
-public:
-    PropArray() = default;
-    PropArray(std::initializer_list<std::pair<std::wstring, std::wstring>> pairs);
-    ~PropArray();
-    PropArray(const PropArray&) = delete;
-    PropArray& operator=(const PropArray&) = delete;
-    std::vector<wchar_t*>& v() { return v_; }
-
-private:
-    std::vector<wchar_t*> v_;
 };
 
 }  // namespace rcptest

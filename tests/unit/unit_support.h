@@ -1,14 +1,15 @@
-// Shared by the unit tests: the launcher's globals back to a known state, and
-// a check that calls end the launch through the fatal path with their message.
+// Shared by the unit tests: the launcher's globals back to a known state,
+// wide text, owned properties arrays, argument vectors, and the check that
+// calls end the launch through the fatal path with their message.
 #ifndef RCP_UNIT_SUPPORT_H
 #define RCP_UNIT_SUPPORT_H
 
 #include <gtest/gtest.h>
 
+#include <cerrno>
 #include <clocale>
+#include <cstring>
 #include <functional>
-#include <string>
-#include <vector>
 
 #include "rcp_launcher.h"
 #include "rcp_launcher_testing.h"
@@ -16,41 +17,45 @@
 
 using namespace rcptest;
 using Strings = std::vector<std::wstring>;
+using Pairs = std::vector<std::pair<std::wstring, std::wstring>>;
 
-inline void resetState(installCfg cfg = undefined, bool mainProcess = true) {
+// The locale of a launch, an empty log queue and no debug output.
+inline void resetState(installCfg cfg = undefined) {
     setlocale(LC_CTYPE, "C.UTF-8");
     resetLoggingForTest();
     setDebug(false);
-    launchArgs.clear();
-    bRestart = bWaitMode = userFirstLaunch = false;
     eConfig = cfg;
-    setMainProcess(mainProcess);
-    pid = 0;
 }
 
-struct Fatal {
-    std::function<void()> run;
-    std::string message;  // must appear in the log
+// ASCII test text (paths, messages) as wide text.
+inline std::wstring W(const std::string& s) { return std::wstring(s.begin(), s.end()); }
+
+// A properties array that owns its strings, as the reader's arrays do.
+struct Props : std::vector<String> {
+    Props(std::initializer_list<Pairs::value_type> pairs = {}) { add(pairs); }
+    ~Props() { freeProperties(*this); }
+    void add(const Pairs& pairs) {
+        for (const auto& [key, value] : pairs) insert(end(), {copyString(key.c_str()), copyString(value.c_str())});
+    }
 };
 
-// Each call must end the process with status 255; its log goes to a
-// directory of its own instead of the shared /tmp/rcplauncher.log.
-inline void expectFatal(const std::vector<Fatal>& cases) {
-    for (const Fatal& c : cases) {
-        SCOPED_TRACE(c.message);
-        TempDir dir;
-        auto run = [&] { enableLogging(dir.wpath()); c.run(); };
-        EXPECT_EXIT(run(), ::testing::ExitedWithCode(255), "");
-        const std::string log = readText(dir.sub("rcplauncher.log"));
-        EXPECT_NE(log.find(c.message), std::string::npos) << log;
-    }
+// An argument vector over the strings of args, closed by a null pointer.
+inline std::vector<wchar_t*> argvOf(Strings& args) {
+    std::vector<wchar_t*> argv;
+    for (std::wstring& a : args) argv.push_back(&a[0]);
+    argv.push_back(nullptr);
+    return argv;
 }
 
-// An owned properties array from key/value pairs.
-inline void addProps(PropArray& props, const std::vector<std::pair<std::wstring, std::wstring>>& pairs) {
-    for (const auto& p : pairs) {
-        props.v().push_back(copyString(p.first.c_str()));
-        props.v().push_back(copyString(p.second.c_str()));
+// Each call must end the process with status 255 and log its message; the
+// log goes to a directory of its own instead of /tmp/rcplauncher.log.
+using Fatal = std::pair<std::function<void()>, std::string>;
+inline void expectFatal(const std::vector<Fatal>& cases) {
+    for (const auto& [run, message] : cases) {
+        TempDir dir;
+        EXPECT_EXIT((enableLogging(W(dir.path())), run()), ::testing::ExitedWithCode(255), "") << message;
+        const std::string log = readText(dir.sub("rcplauncher.log"));
+        EXPECT_NE(log.find(message), std::string::npos) << message << " not in:\n" << log;
     }
 }
 
