@@ -3,12 +3,10 @@
 // own start included), and how the effective arguments ('-config NAME'
 // extensions, "-debug", "-console", "-restart", "-rcpLauncherWait") shape the
 // child and the launcher's own behaviour.
-#include <gtest/gtest.h>
 
 #include "sandbox.h"
 
 using namespace rcptest;
-using V = std::vector<std::string>;
 
 // Every input that the builders read, for each install configuration: the
 // launcher's own options (passed on, held back or overriding a property),

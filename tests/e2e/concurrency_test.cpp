@@ -1,7 +1,6 @@
 // The platform lock between launchers of one workspace: many launchers
 // started at the same moment make exactly one main process, and a launcher
 // that restarts the platform waits for the one it replaces.
-#include <gtest/gtest.h>
 #include <sys/wait.h>
 
 #include <chrono>

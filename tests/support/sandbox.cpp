@@ -11,12 +11,9 @@
 #endif
 
 #include <cerrno>
-#include <chrono>
-#include <cstring>
 #include <filesystem>
 #include <iterator>
 #include <sstream>
-#include <thread>
 
 namespace rcptest {
 
@@ -43,23 +40,6 @@ Tree snapshot(const std::string& root) {
             name == "rcplauncher.log" || name == ".rcp.lock" ? e.substr(0, e.find('\n')) : e;
     }
     return tree;
-}
-
-std::vector<std::string> names(const Tree& tree) {
-    std::vector<std::string> out;
-    for (const auto& e : tree) out.push_back(e.first);
-    return out;
-}
-
-std::string lastLine(std::string log) {
-    while (!log.empty() && log.back() == '\n') log.pop_back();
-    return log.substr(log.rfind('\n') + 1);
-}
-
-bool isErrorLine(const std::string& line, const std::string& message) {
-    for (int e = 0; e < 256; e++)
-        if (line == message + " : " + strerror(e)) return true;
-    return false;
 }
 
 Sandbox::Sandbox(const std::string& configuration, const std::string& launcherExtra, const std::string& installExtra)
@@ -95,14 +75,12 @@ void Sandbox::freshHome() {
 
 namespace {
 
-// Polls done() until it holds (true) or `seconds` have passed (false).
+// Polls done() every 5 ms until it holds (true) or `seconds` have passed (false).
 template <class F>
 bool poll(int seconds, F done) {
-    for (const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(seconds); !done();) {
-        if (std::chrono::steady_clock::now() > end) return false;
-        std::this_thread::sleep_for(std::chrono::milliseconds(5));
-    }
-    return true;
+    for (int i = 0; i < seconds * 200; i++, usleep(5000))
+        if (done()) return true;
+    return false;
 }
 
 // The records in dir, one file per child named by its process id.
@@ -175,8 +153,7 @@ Result Sandbox::runMany(const std::vector<Launch>& launches) {
     size_t expected = 0;
     for (size_t i = 0; i < launches.size(); i++) {
         const Launch& l = launches[i];
-        if (l.killAfterUs >= 0) std::this_thread::sleep_for(std::chrono::microseconds(l.killAfterUs));
-        if (l.killAfterUs >= 0) kill(pids[i], SIGKILL);
+        if (l.killAfterUs >= 0 && usleep(static_cast<useconds_t>(l.killAfterUs)) == 0) kill(pids[i], SIGKILL);
         int st = 0;
         if (!poll(120, [&] { return waitpid(pids[i], &st, WNOHANG) == pids[i]; }) && kill(pids[i], SIGKILL) == 0)
             waitpid(pids[i], &st, 0);

@@ -23,6 +23,7 @@
 #ifndef RCP_SANDBOX_H
 #define RCP_SANDBOX_H
 
+#include <gtest/gtest.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -35,6 +36,7 @@
 
 namespace rcptest {
 
+using V = std::vector<std::string>;
 // The fixed log of launches that fail before their log directory is known.
 inline const char* const kTmpLog = "/tmp/rcplauncher.log";
 inline const int kNobody = 65534;
@@ -60,10 +62,15 @@ std::string entry(const std::string& path);
 // and the kind count.
 using Tree = std::map<std::string, std::string>;
 Tree snapshot(const std::string& root);
-std::vector<std::string> names(const Tree& tree);
-std::string lastLine(std::string log);  // the last one that is not empty
-// True when line is message + " : " + the system's text for some errno value.
-bool isErrorLine(const std::string& line, const std::string& message);
+inline V names(const Tree& tree) {
+    V out;
+    for (const auto& e : tree) out.push_back(e.first);
+    return out;
+}
+inline std::string lastLine(std::string log) {  // the last one that is not empty
+    while (!log.empty() && log.back() == '\n') log.pop_back();
+    return log.substr(log.rfind('\n') + 1);
+}
 
 struct Child {
     long pid = 0;
