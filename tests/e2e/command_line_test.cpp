@@ -87,8 +87,6 @@ TEST(CommandLine, MultiUserServiceStart) {
     EXPECT_EQ(names(snapshot(ws)), (V{".config/", ".config/config.ini", ".config/org.eclipse.update/",
                                       ".config/org.eclipse.update/platform.xml", ".config/rcpinstall.properties",
                                       ".rcp.lock", "logs/", "logs/rcplauncher.log"}));
-    EXPECT_NE(readText(ws + "/.config/rcpinstall.properties").find("\nrcp.install.id=SVC7\nvm=${rcp.home}/jre/bin/java\n"),
-              std::string::npos);
     EXPECT_LT(r.log.find("RLNCH0043I: UserName: muservice\n"),
               r.log.find("RLNCH0132I: ===== Begin Parameters =====\n" + sb.jvm + "\n-Dvmarg.one=1\n"));
 }
@@ -101,38 +99,47 @@ TEST(CommandLine, MultiUserServiceStart) {
 // launcher stays until its platform ends ("-rcpLauncherWait" or "-console",
 // not on a restart); a launcher that waited exits 0 whatever the platform's
 // status. Without library path keys the inherited LD_LIBRARY_PATH reaches
-// the child unchanged. The platform lives a second: long enough that a
-// launcher which does not wait cannot have reaped it.
+// the child unchanged. A JVM named with "-vm" brings the jvm.properties three
+// levels above it, also when named with backslashes; "-vm" without a value
+// leaves the installation's JVM. The platform lives a second: long enough
+// that a launcher which does not wait cannot have reaped it.
 TEST(CommandLine, EffectiveArguments) {
-    // typed arguments, the platform options, the VM arguments before the configured ones, debug output, waits
-    const std::tuple<V, V, V, bool, bool> cases[] = {
-        {{"-config", "x", "-bar", "-vmargs", "-Dv=1"}, {"-bar", "-foo"}, {"-Dv=1", "-Xmx1g", "-Dfix=1"}, false, false},
-        {{"-bar", "-config", "x"}, {"-bar", "-foo"}, {"-Xmx1g", "-Dfix=1"}, false, false},
-        {{"-config", "nothing", "-bar"}, {"-bar"}, {"-Dfix=1"}, false, false},
-        {{"-config", "dbg"}, {"-debug"}, {"-Dfix=1"}, true, false},
-        {{"-debug"}, {"-debug"}, {"-Dfix=1"}, true, false},
-        {{"-restart", "-config", "dbg"}, {}, {"-Dfix=1"}, false, false},
-        {{"-console", "-debug"}, {"-console", "-debug"}, {}, true, true},
-        {{"-config", "con"}, {"-console"}, {}, false, true},
-        {{"-rcpLauncherWait"}, {"-rcpLauncherWait"}, {"-Dfix=1"}, false, true},
-        {{"-restart", "-console", "-debug"}, {}, {"-Dfix=1"}, false, false},
-        {{"-restart", "-rcpLauncherWait"}, {"-rcpLauncherWait"}, {"-Dfix=1"}, false, true},
-        {{"-consoleLog"}, {"-consoleLog"}, {"-Dfix=1"}, false, false},
+    // typed arguments; the child's platform options, "|", and its VM arguments before the configured one;
+    // debug output; the launcher waits
+    const std::tuple<V, std::string, bool, bool> cases[] = {
+        {{"-config", "x", "-bar", "-vmargs", "-Dv=1"}, "-bar -foo | -Dv=1 -Xmx1g -Dfix", false, false},
+        {{"-bar", "-config", "x"}, "-bar -foo | -Xmx1g -Dfix", false, false},
+        {{"-config", "nothing", "-bar"}, "-bar | -Dfix", false, false},
+        {{"-config", "dbg"}, "-debug | -Dfix", true, false},
+        {{"-debug"}, "-debug | -Dfix", true, false},
+        {{"-restart", "-config", "dbg"}, "| -Dfix", false, false},
+        {{"-console", "-debug"}, "-console -debug |", true, true},
+        {{"-config", "con"}, "-console |", false, true},
+        {{"-rcpLauncherWait"}, "-rcpLauncherWait | -Dfix", false, true},
+        {{"-restart", "-console", "-debug"}, "| -Dfix", false, false},
+        {{"-restart", "-rcpLauncherWait"}, "-rcpLauncherWait | -Dfix", false, true},
+        {{"-consoleLog"}, "-consoleLog | -Dfix", false, false},
+        {{"-vm", "k\\jre\\bin\\java"}, "| -Dfix", false, false},
+        {{"-vm"}, "| -Dfix", false, false},
     };
     Sandbox sb("user", "config.x.1=-foo\nconfig.x.2=-vmargs\nconfig.x.3=-Xmx1g\nconfig.dbg.1=-debug\nconfig.con.1=-console\n",
-               "vmfix.noconsole=-Dfix=1\n");
-    for (const auto& [args, platform, vm, debug, waits] : cases) {
+               "vmfix.noconsole=-Dfix\n");
+    sb.write("k/jvm.properties", "-Dk=1\n");
+    for (const auto& [args, expected, debug, waits] : cases) {
         SCOPED_TRACE(::testing::PrintToString(args));
         Result r = sb.run({args, {{"RCP_STUB_SLEEP", "1"}, {"RCP_STUB_EXIT", "7"}, {"LD_LIBRARY_PATH", "/opt/lib"}}});
-        const V& argv = r.child().argv;
-        const int data = r.child().index("-data"), vmargs = r.child().index("-vmargs");
-        const int configured = r.child().index("-Dvmarg.one=1");
+        const Child& c = r.child();
+        const int data = c.index("-data"), vmargs = c.index("-vmargs"), configured = c.index("-Dvmarg.one=1");
         ASSERT_TRUE(r.status == 0 && data > 0 && vmargs > data && configured > vmargs) << r.describe();
-        EXPECT_EQ(V(argv.begin() + 1, argv.begin() + data), platform);
-        EXPECT_EQ(V(argv.begin() + vmargs + 1, argv.begin() + configured), vm);
-        EXPECT_EQ(argv.back(), "-XstartOnFirstThread");
-        EXPECT_EQ(r.child().env.at("LD_LIBRARY_PATH"), "/opt/lib");
+        std::string shown;
+        for (int i = 1; i < configured; i++) shown += i < data || i > vmargs ? " " + c.argv[i] : i == data ? " |" : "";
+        EXPECT_EQ(shown.substr(1), expected);
+        EXPECT_EQ(c.argv.back(), "-XstartOnFirstThread");
+        EXPECT_EQ(c.env.at("LD_LIBRARY_PATH"), "/opt/lib");
         EXPECT_EQ(r.log.find("RLNCH0132I: ===== Begin Parameters =====") != std::string::npos, debug) << r.log;
-        EXPECT_EQ(r.child().reapedByLauncher, waits);
+        EXPECT_EQ(c.reapedByLauncher, waits);
+        const bool k = args.size() == 2 && args[0] == "-vm";
+        EXPECT_EQ(c.after("-vm"), k ? args[1] : sb.jvm);
+        EXPECT_EQ(c.index("-Dk=1") != -1, k);
     }
 }

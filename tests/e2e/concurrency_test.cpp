@@ -27,7 +27,6 @@ TEST(Concurrency, ManyLaunchersAtOnceMakeOneMainProcess) {
         SCOPED_TRACE("round " + std::to_string(round));
         if (round > 0) sb.freshHome();
         Result r = sb.runMany(std::vector<Launch>(32, Launch({}, {{"RCP_STUB_SLEEP", "300"}})));
-        EXPECT_EQ(r.statuses, std::vector<int>(32, 0)) << r.describe();
         ASSERT_EQ(r.children.size(), 32u) << r.describe();
         EXPECT_EQ(r.tmpLog, "");
         EXPECT_EQ(r.log.find("RLNCH"), std::string::npos) << r.log;

@@ -253,68 +253,31 @@ TEST(Faults, PreloadLinkIsOnlyEverOurOwn) {
     }
 }
 
-// The disk fills at any moment of a first launch: for every amount of free
-// space (in pages), the launch starts the platform or ends with its message,
-// every file it writes for the user is complete or absent (a missing
-// platform.xml is only reported with -debug; a missing per-user
-// rcpinstall.properties ends the launch), and once there is room again the
-// next launch writes exactly what a launch with room writes. A startup record
-// that changed but no longer fits leaves the previous one.
-TEST(Faults, FullDiskLeavesEveryFileCompleteOrAbsent) {
-    if (notRoot("a small tmpfs")) GTEST_SKIP();
-    // Base files of several pages, so that a copy can be cut half-way.
-    Sandbox sb("user", "", "# " + std::string(20000, 'p') + "\n");
+// A first launch cut short must leave nothing that makes the next launch
+// fail or lose a file. The base files span several pages, so that a copy
+// can be cut half-way.
+//
+// Killed at a random moment (SIGKILL: no handler, no exit path): the next
+// launch starts the platform as the main process, the user's own files are
+// all still there, and the configuration area holds exactly the files a
+// clean first launch writes. Every other round finds the user's data in the
+// workspace, the others a fresh home. The moments are spread over the time
+// a whole launch takes, measured here (so sanitizers and valgrind stretch
+// them alike); RCP_KILL_ROUNDS and RCP_KILL_SEED repeat a longer or a given
+// run.
+//
+// The disk full at any moment (the home a tmpfs of 1, 2, 3 ... pages): the
+// launch starts the platform or ends with its message, every file it writes
+// for the user is complete or absent (a missing platform.xml is only
+// reported with -debug; a missing per-user rcpinstall.properties ends the
+// launch), and once there is room again the next launch writes exactly what
+// a launch with room writes. A startup record that changed but no longer
+// fits leaves the previous one.
+TEST(Faults, InterruptedFirstLaunchesLeaveAUsableArea) {
+    Sandbox sb("user", "", "resetDir.a=org.x\n# " + std::string(20000, 'p') + "\n");
     std::string xml = "<config>\n";
     while (xml.size() < 40000) xml += "  <site url=\"platform:/base/" + std::to_string(xml.size()) + "\"/>\n";
     sb.write(sb.base + "/platform.xml", xml + "</config>\n");
-    const std::string disk = sb.path("disk"), cfg = disk + "/ws/.config", log = disk + "/ws/logs/rcplauncher.log";
-    makeDirs(disk);
-    // A fresh tmpfs of that size, or (MS_REMOUNT) the mounted one resized; 0: to what it holds now.
-    auto mountDisk = [&](long bytes, unsigned long flags) {
-        struct statvfs v;
-        if (bytes == 0 && statvfs(disk.c_str(), &v) == 0) bytes = static_cast<long>((v.f_blocks - v.f_bfree) * v.f_frsize);
-        if (flags == 0) umount2(disk.c_str(), MNT_DETACH);
-        return mount("tmpfs", disk.c_str(), "tmpfs", flags, ("size=" + std::to_string(bytes)).c_str()) == 0;
-    };
-    const std::shared_ptr<void> unmount(nullptr, [&](void*) { umount2(disk.c_str(), MNT_DETACH); });
-    if (!mountDisk(1 << 20, 0)) GTEST_SKIP() << "cannot mount a tmpfs here: " << strerror(errno);
-    const Launch o({"-data", disk + "/ws"});
-    ASSERT_EQ(sb.run(o).status, 0);
-    const Tree reference = snapshot(cfg);
-    std::set<std::string> endings;
-    for (long pages = 1; pages <= 64; pages++) {  // (a size of 0 means no limit)
-        SCOPED_TRACE(std::to_string(pages) + " pages free");
-        ASSERT_TRUE(mountDisk(pages * 4096, 0));
-        Result r = sb.run(o);
-        const std::string last = lastLine(r.tmpLog.empty() ? readText(log) : r.tmpLog);
-        EXPECT_TRUE(r.status == 0 || (r.status == 255 && r.children.empty())) << r.describe();
-        if (r.status != 0) endings.insert(last.substr(0, last.find(':')));
-        const Tree files = snapshot(cfg);
-        for (const auto& f : files) EXPECT_EQ(reference.count(f.first) ? reference.at(f.first) : "", f.second) << f.first;
-        ASSERT_TRUE(mountDisk(1 << 20, MS_REMOUNT));
-        ASSERT_EQ(sb.run(o).status, 0);
-        EXPECT_EQ(snapshot(cfg), reference);
-        if ((r.status == 0 && files == reference) || ::testing::Test::HasFailure()) break;
-    }
-    // Among the endings: the per-user properties could not be completed.
-    EXPECT_TRUE(endings.count("RLNCH0014E")) << ::testing::PrintToString(endings);
-    ASSERT_TRUE(mountDisk(0, MS_REMOUNT));
-    EXPECT_EQ(sb.run({{"-data", disk + "/ws", "-changed"}}).status, 255);
-    EXPECT_EQ(lastLine(readText(log)), "RLNCH0020E: Error writing to " + cfg + "/args.properties file. : " + strerror(ENOSPC));
-    EXPECT_EQ(snapshot(cfg), reference);
-}
-
-// A first launch killed at a random moment (SIGKILL: no handler, no exit
-// path) must leave nothing that makes the next launch fail or lose a file:
-// the next launch starts the platform as the main process, the user's own
-// files are all still there, and the configuration area holds exactly the
-// files a clean first launch writes. Every other round finds the user's
-// data in the workspace, the others a fresh home. The
-// moments are spread over the time a whole launch takes, measured here (so
-// sanitizers and valgrind stretch them alike). RCP_KILL_ROUNDS and
-// RCP_KILL_SEED repeat a longer or a given run.
-TEST(Faults, LaunchesKilledAtRandomMomentsLeaveAUsableArea) {
-    Sandbox sb("user", "", "resetDir.a=org.x\n");
     const char* rounds = getenv("RCP_KILL_ROUNDS");
     const char* seedText = getenv("RCP_KILL_SEED");
     const unsigned seed = seedText && *seedText ? static_cast<unsigned>(atol(seedText)) : std::random_device()();
@@ -338,7 +301,6 @@ TEST(Faults, LaunchesKilledAtRandomMomentsLeaveAUsableArea) {
         SCOPED_TRACE("round " + std::to_string(round) + ", killed after " + std::to_string(killed.killAfterUs) + " us");
         const int status = sb.run(killed).status;
         EXPECT_TRUE(status == 128 + SIGKILL || status == 0) << status;
-
         Result r = sb.run();
         ASSERT_EQ(r.children.size(), 1u) << r.describe();
         EXPECT_EQ(r.child().index("-useDaemon"), -1);
@@ -346,4 +308,38 @@ TEST(Faults, LaunchesKilledAtRandomMomentsLeaveAUsableArea) {
         for (const auto& e : before) EXPECT_EQ(after.count(e.first) ? after.at(e.first) : "(gone)", e.second) << e.first;
         EXPECT_EQ(snapshot(sb.cfg), reference);
     }
+
+    if (notRoot("a small tmpfs")) return;
+    sb.freshHome();
+    // A fresh tmpfs of that size as the home, or (MS_REMOUNT) the mounted one resized; 0: to what it holds now.
+    auto mountHome = [&](long bytes, unsigned long flags) {
+        struct statvfs v;
+        if (bytes == 0 && statvfs(sb.home.c_str(), &v) == 0) bytes = static_cast<long>((v.f_blocks - v.f_bfree) * v.f_frsize);
+        if (flags == 0) umount2(sb.home.c_str(), MNT_DETACH);
+        return mount("tmpfs", sb.home.c_str(), "tmpfs", flags, ("size=" + std::to_string(bytes)).c_str()) == 0;
+    };
+    const std::shared_ptr<void> unmount(nullptr, [&](void*) { umount2(sb.home.c_str(), MNT_DETACH); });
+    if (!mountHome(1 << 20, 0)) GTEST_SKIP() << "cannot mount a tmpfs here: " << strerror(errno);
+    std::set<std::string> endings;
+    for (long pages = 1; pages <= 64; pages++) {  // (a size of 0 means no limit)
+        SCOPED_TRACE(std::to_string(pages) + " pages free");
+        ASSERT_TRUE(mountHome(pages * 4096, 0));
+        Result r = sb.run();
+        const std::string last = lastLine(r.tmpLog.empty() ? r.log : r.tmpLog);
+        EXPECT_TRUE(r.status == 0 || (r.status == 255 && r.children.empty())) << r.describe();
+        if (r.status != 0) endings.insert(last.substr(0, last.find(':')));
+        const Tree files = snapshot(sb.cfg);
+        for (const auto& f : files) EXPECT_EQ(reference.count(f.first) ? reference.at(f.first) : "", f.second) << f.first;
+        ASSERT_TRUE(mountHome(1 << 20, MS_REMOUNT));
+        ASSERT_EQ(sb.run().status, 0);
+        EXPECT_EQ(snapshot(sb.cfg), reference);
+        if ((r.status == 0 && files == reference) || ::testing::Test::HasFailure()) break;
+    }
+    // Among the endings: the per-user properties could not be completed.
+    EXPECT_TRUE(endings.count("RLNCH0014E")) << ::testing::PrintToString(endings);
+    ASSERT_TRUE(mountHome(0, MS_REMOUNT));
+    Result r = sb.run({{"-changed"}});
+    EXPECT_EQ(r.status, 255);
+    EXPECT_EQ(lastLine(r.log), "RLNCH0020E: Error writing to " + sb.cfg + "/args.properties file. : " + strerror(ENOSPC));
+    EXPECT_EQ(snapshot(sb.cfg), reference);
 }

@@ -1,7 +1,7 @@
 // What a launch leaves in the user's areas: the files of a first launch,
 // their stability on later launches, resets, an area of another
-// installation, and the launches decided during startup (a "-vm" override,
-// an initial configuration run, provisioning).
+// installation, and the launches decided during startup (an initial
+// configuration run, provisioning).
 #include <unistd.h>
 
 #include <cerrno>
@@ -11,23 +11,31 @@
 
 using namespace rcptest;
 
-// A first launch into an empty home creates exactly the user's areas and
-// files; a second launch leaves every per-user file alone even though the
+// The life of a workspace. A first launch into an empty home creates
+// exactly the user's areas and files. The base files begin with empty lines
+// and hold bytes in two encodings, and the first launch has no LANG (as when
+// the Finder starts it): the copies carry every byte unchanged.
+// "-resetconfig" on a first launch resets nothing and is not recorded. It
+// reaches the launcher through a link in an rcp directory of its own beside
+// a decoy, a later one through a linked installation: the installation is
+// the one where the executable really lies, and the startup record names the
+// resolved program.
+//
+// A later launch leaves every per-user file alone even though the
 // installation's copies changed in between, and rewrites its log and startup
 // record however long the earlier text was (without "-debug" the log is just
-// the empty line that closes the empty queue). The base files begin with
-// empty lines and hold bytes in two encodings, and the first launch has no
-// LANG (as when the Finder starts it): the copies carry every byte
-// unchanged. "-resetconfig" on a first launch resets nothing and is not
-// recorded. Both launches reach the launcher through links, as an rcp
-// directory of its own beside a decoy and through a linked installation:
-// the installation is the one where the executable really lies, and the
-// startup record names the resolved program.
-TEST(UserAreas, FirstLaunchCreatesThePerUserFilesAndLaterLaunchesKeepThem) {
-    Sandbox sb("user", "com.kel.rcp.core.locale=fr_FR\n",
-               "os.value.macosx=mac\nos.value.win32=win\\\n    continued\nos.value.linux=tux\n\n"
+// the empty line that closes the empty queue); a "-resetconfig" that comes
+// from the launcher properties is no request to reset. Only one typed on the
+// command line resets: the configuration area goes to its backup, the
+// listed plug-in state directories go, and the files come back from the
+// installation's copies. A configuration area written by another
+// installation is set aside for a fresh one, keeping its platform.xml beside
+// it in the workspace.
+TEST(UserAreas, LifeOfAWorkspace) {
+    Sandbox sb("user", "com.kel.rcp.core.locale=fr_FR\nconfig.rs.1=-resetconfig\n",
+               "os.value.macosx=mac\nos.value.win32=win\\\n    continued\nos.value.linux=tux\nresetDir.a=org.x\n\n"
                "# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n");
-    const std::string cfg = sb.cfg, longArg = "/a/long/argument/" + std::string(3000, 'x');
+    const std::string ws = sb.ws, cfg = sb.cfg, longArg = "/a/long/argument/" + std::string(3000, 'x');
     sb.write(sb.base + "/rcpinstall.properties", "\n\n" + readText(sb.base + "/rcpinstall.properties"));
     sb.write(sb.base + "/platform.xml", "\n<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n  <site url=\"platform:/base/\" "
                                        "enabled=\"true\">\n    <feature id=\"${jvm.feature.id}\" version=\"1.0\"/>\n  </site>\n"
@@ -36,58 +44,45 @@ TEST(UserAreas, FirstLaunchCreatesThePerUserFilesAndLaterLaunchesKeepThem) {
     sb.write("links/rcp/rcplauncher.properties", "rcp.install.id=WRONG\n");
     ASSERT_EQ(symlink(sb.launcher.c_str(), sb.path("links/rcp/rcplauncher").c_str()), 0);
     ASSERT_EQ(symlink(sb.inst.c_str(), sb.path("links/inst").c_str()), 0);
-    Result first = sb.run({{"-resetconfig", "-debug", "a b", longArg}, {{"LANG", ""}}, sb.path("links/rcp/rcplauncher")});
-    ASSERT_EQ(first.status, 0) << first.describe();
-    EXPECT_EQ(first.tmpLog, "");
-
-    const std::string ws = "KEL/RCP/ID42/tester/";
-    const V tree = {"KEL/", "KEL/RCP/", "KEL/RCP/ID42/", ws, ws + ".config/", ws + ".config/args.properties",
-                    ws + ".config/config.ini", ws + ".config/org.eclipse.update/",
-                    ws + ".config/org.eclipse.update/platform.xml", ws + ".config/rcpinstall.properties",
-                    ws + ".rcp.lock", ws + "applications/", ws + "applications/eclipse/",
-                    ws + "applications/eclipse/features/", ws + "applications/eclipse/plugins/", ws + "logs/",
-                    ws + "logs/rcplauncher.log"};
+    Result r = sb.run({{"-resetconfig", "-debug", "a b", longArg}, {{"LANG", ""}}, sb.path("links/rcp/rcplauncher")});
+    ASSERT_EQ(r.status, 0) << r.describe();
+    EXPECT_EQ(r.tmpLog, "");
+    const std::string w = "KEL/RCP/ID42/tester/";
+    V tree = {"KEL/", "KEL/RCP/", "KEL/RCP/ID42/", w};
+    for (const char* p : {".config/", ".config/args.properties", ".config/config.ini", ".config/org.eclipse.update/",
+                          ".config/org.eclipse.update/platform.xml", ".config/rcpinstall.properties", ".rcp.lock",
+                          "applications/", "applications/eclipse/", "applications/eclipse/features/",
+                          "applications/eclipse/plugins/", "logs/", "logs/rcplauncher.log"})
+        tree.push_back(w + p);
     EXPECT_EQ(names(snapshot(sb.home)), tree);
     EXPECT_EQ(readText(cfg + "/args.properties"),
               "arg0=" + sb.launcher + "\narg1=-debug\narg2=a b\narg3=" + longArg + "\nargc=4\n");
-    EXPECT_NE(first.log.find(longArg), std::string::npos) << "the debug log shows the child's arguments";
+    EXPECT_NE(r.log.find(longArg), std::string::npos) << "the debug log shows the child's arguments";
     EXPECT_EQ(readText(cfg + "/config.ini"), "osgi.bundles=x\n# caf\xe9 \xc3\xb6\n");
     EXPECT_EQ(readText(cfg + "/org.eclipse.update/platform.xml"),
               "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n<site url=\"platform:/base/\" enabled=\"true\">\n"
               "<feature>\n</site>\n</config>\n<!-- caf\xe9 \xc3\xb6 -->\n");
     EXPECT_EQ(readText(cfg + "/rcpinstall.properties"),
-              kInstallProps + "os.value=mac\n# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\nrcp.install.id=ID42\n"
-                              "vm=${rcp.home}/jre/bin/java\nrcp.base.location=${rcp.home}/base\n"
+              kInstallProps + "os.value=mac\nresetDir.a=org.x\n# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n"
+                              "rcp.install.id=ID42\nvm=${rcp.home}/jre/bin/java\nrcp.base.location=${rcp.home}/base\n"
                               "install.configuration=user\ncom.kel.rcp.core.locale=fr_FR\n");
 
-    Tree before = snapshot(cfg);
-    for (const char* f : {"/config.ini", "/platform.xml", "/rcpinstall.properties"}) sb.write(sb.base + f, "changed=1\n");
-    sb.write(sb.props, launcherProps("user") + "com.kel.rcp.core.bidi=true\n");
-    Result second = sb.run({{"-x"}, {}, sb.path("links/inst/rcp/rcplauncher")});
-    EXPECT_NE(second.child().index("-Drcp.home=" + sb.inst), -1) << second.describe();
-    EXPECT_EQ(names(snapshot(sb.home)), tree);
-    before["args.properties"] = "uid " + std::to_string(geteuid()) + " file\narg0=" + sb.launcher + "\narg1=-x\nargc=2\n";
-    EXPECT_EQ(snapshot(cfg), before);
-    EXPECT_EQ(second.log, "\n");
-}
-
-// Only "-resetconfig" typed on the command line of a later launch resets:
-// the configuration area goes to its backup, the listed plug-in state
-// directories go, and the files come back from the installation's copies.
-TEST(UserAreas, ResetComesOnlyFromTheTypedCommandLine) {
-    Sandbox sb("user", "config.rs.1=-resetconfig\n", "resetDir.a=org.x\n");
-    const std::string ws = sb.ws, cfg = sb.cfg;
-    ASSERT_EQ(sb.run({{"-resetconfig"}}).status, 0);
     sb.write(cfg + "/marker", "old area");
     sb.write(ws + "/.metadata/.plugins/org.x/state", "x");
     sb.write(ws + "/.metadata/.plugins/org.y/state", "y");
-    // "-resetconfig" coming from the launcher properties is not a request.
-    ASSERT_EQ(sb.run({{"-config", "rs"}}).status, 0);
-    EXPECT_TRUE(pathExists(cfg + "/marker") && pathExists(ws + "/.metadata/.plugins/org.x/state"));
+    Tree before = snapshot(ws);
+    for (const char* f : {"/config.ini", "/platform.xml", "/rcpinstall.properties"}) sb.write(sb.base + f, "changed=1\n");
+    sb.write(sb.props, launcherProps("user") + "config.rs.1=-resetconfig\nresetDir.a=org.x\ncom.kel.rcp.core.bidi=true\n");
+    r = sb.run({{"-config", "rs"}, {}, sb.path("links/inst/rcp/rcplauncher")});
+    EXPECT_NE(r.child().index("-Drcp.home=" + sb.inst), -1) << r.describe();
+    before[".config/args.properties"] = "uid " + std::to_string(geteuid()) + " file\narg0=" + sb.launcher +
+                                        "\narg1=-config\narg2=rs\nargc=3\n";
+    EXPECT_EQ(snapshot(ws), before);
+    EXPECT_EQ(r.log, "\n");
 
     sb.write(sb.base + "/config.ini", "fresh=1\n");
-    Result reset = sb.run({{"-resetconfig"}});
-    EXPECT_EQ(reset.child().index("-resetconfig"), -1);
+    r = sb.run({{"-resetconfig"}});
+    EXPECT_EQ(r.child().index("-resetconfig"), -1);
     EXPECT_EQ(readText(ws + "/.configbak/marker"), "old area");
     EXPECT_EQ(names(snapshot(cfg)), (V{"args.properties", "config.ini", "org.eclipse.update/",
                                        "org.eclipse.update/platform.xml", "rcpinstall.properties"}));
@@ -95,49 +90,16 @@ TEST(UserAreas, ResetComesOnlyFromTheTypedCommandLine) {
     EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher + "\nargc=1\n");
     EXPECT_FALSE(pathExists(ws + "/.metadata/.plugins/org.x"));
     EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.y/state"));
-}
 
-// A configuration area written by another installation is set aside for a
-// fresh one, keeping its platform.xml beside it in the workspace.
-TEST(UserAreas, AreaOfAnotherInstallationIsSetAside) {
-    Sandbox sb;
-    const std::string data = sb.path("data");
-    sb.install("user", "rcp.data=" + data + "/\n");
-    ASSERT_EQ(sb.run().status, 0);
-    const std::string oldPlatformXml = readText(data + "/.config/org.eclipse.update/platform.xml");
+    const std::string platformXml = readText(cfg + "/org.eclipse.update/platform.xml");
     sb.write(sb.props, "rcp.install.id=ID43\nrcp.base.location=${rcp.home}/base\n"
-                         "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=user\nrcp.data=" + data + "/\n");
-    Result r = sb.run();
-    EXPECT_EQ(r.child().after("-data"), data);
+                       "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=user\nrcp.data=" + ws + "/\n");
+    r = sb.run();
+    EXPECT_EQ(r.child().after("-data"), ws);
     EXPECT_NE(r.child().index("-Dcom.kel.rcp.install.id=ID43"), -1);
-    EXPECT_EQ(readText(data + "/platform.xml.old"), oldPlatformXml);
-    EXPECT_NE(readText(data + "/.configbak/rcpinstall.properties").find("rcp.install.id=ID42\n"), std::string::npos);
-    EXPECT_NE(readText(data + "/.config/rcpinstall.properties").find("rcp.install.id=ID43\n"), std::string::npos);
-}
-
-// A JVM named with "-vm" brings the jvm.properties three levels above it; a
-// path too shallow for that stops the startup before the command line is
-// built, so no child runs, though the user's files are in place.
-TEST(UserAreas, VmOverrideAndItsJvmProperties) {
-    // "-vm" value ("@" the sandbox root, "" none), a child starts, jvm.properties giving -Dfrom.jvm.props=1
-    const std::tuple<std::string, bool, std::string> cases[] = {
-        {"java", false, ""}, {"bin/java", false, ""}, {"/jre/bin/java", true, ""}, {"", true, ""},
-        {"@/j/jre/bin/java", true, "j/jvm.properties"}, {"k\\jre\\bin\\java", true, "k/jvm.properties"}};
-    Sandbox sb;
-    for (const auto& [value, child, jvmProps] : cases) {
-        const std::string vm = value.find('@') == 0 ? sb.root + value.substr(1) : value;
-        SCOPED_TRACE(vm);
-        sb.freshHome();
-        if (!jvmProps.empty()) sb.write(jvmProps, "-Dfrom.jvm.props=1\n");
-        Launch launch(vm.empty() ? V{"-vm"} : V{"-vm", vm});
-        launch.children = child;
-        Result r = sb.run(launch);
-        EXPECT_EQ(r.status, 0) << r.describe();
-        EXPECT_EQ(r.child().after("-vm"), !child ? "" : vm.empty() ? sb.jvm : vm);
-        EXPECT_EQ(r.child().index("-Dfrom.jvm.props=1") != -1, !jvmProps.empty());
-        EXPECT_TRUE(pathExists(sb.cfg + "/rcpinstall.properties"));
-        EXPECT_EQ(pathExists(sb.cfg + "/org.eclipse.update"), child);
-    }
+    EXPECT_EQ(readText(ws + "/platform.xml.old"), platformXml);
+    EXPECT_NE(readText(ws + "/.configbak/rcpinstall.properties").find("rcp.install.id=ID42\n"), std::string::npos);
+    EXPECT_NE(readText(cfg + "/rcpinstall.properties").find("rcp.install.id=ID43\n"), std::string::npos);
 }
 
 // A platform that has not finished its initial configuration is started

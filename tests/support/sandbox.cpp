@@ -95,10 +95,6 @@ std::vector<Child> records(const std::string& dir) {
         std::getline(in, field, '\0');
         for (long argc = std::stol(field); argc > 0 && std::getline(in, field, '\0'); argc--) c.argv.push_back(field);
         while (std::getline(in, field, '\0')) c.env[field.substr(0, field.find('='))] = field.substr(field.find('=') + 1);
-        // valgrind leaves LD_PRELOAD set but empty for the programs its
-        // client starts; for the loader that is the same as not set.
-        if (getenv("RCP_LAUNCHER_WRAPPER") && c.env.count("LD_PRELOAD") && c.env["LD_PRELOAD"].empty())
-            c.env.erase("LD_PRELOAD");
         out.push_back(c);
     }
     return out;
@@ -137,10 +133,8 @@ Result Sandbox::runMany(const std::vector<Launch>& launches) {
         close(gate[1]);
         char c;
         while (read(gate[0], &c, 1) < 0 && errno == EINTR) continue;
-        const int in = open("/dev/null", O_RDONLY | O_CLOEXEC);
         const int out = open(terminal.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
-        if (in < 0 || out < 0 || dup2(in, 0) < 0 || dup2(out, 1) < 0 || dup2(out, 2) < 0 || close(gate[0]) != 0 ||
-            chdir(root.c_str()) != 0 ||
+        if (out < 0 || dup2(out, 1) < 0 || dup2(out, 2) < 0 || close(gate[0]) != 0 || chdir(root.c_str()) != 0 ||
             (l.user >= 0 && (setgroups(0, nullptr) != 0 || setgid(l.user) != 0 || setuid(l.user) != 0)))
             _exit(126);
         execv(argv[0], argv.data());
@@ -157,10 +151,10 @@ Result Sandbox::runMany(const std::vector<Launch>& launches) {
         int st = 0;
         if (!poll(120, [&] { return waitpid(pids[i], &st, WNOHANG) == pids[i]; }) && kill(pids[i], SIGKILL) == 0)
             waitpid(pids[i], &st, 0);
-        res.statuses.push_back(WIFEXITED(st) ? WEXITSTATUS(st) : 128 + WTERMSIG(st));
-        expected += l.killAfterUs >= 0 ? 0 : l.children >= 0 ? l.children : res.statuses[i] == 0;
+        const int status = WIFEXITED(st) ? WEXITSTATUS(st) : 128 + WTERMSIG(st);
+        res.status = i == 0 ? status : res.status;
+        expected += l.killAfterUs < 0 && status == 0;
     }
-    res.status = res.statuses.front();
     // A child records first thing; the last ones may still be starting.
     poll(15, [&] { return records(recordDir).size() >= expected; });
     res.children = records(recordDir);

@@ -96,12 +96,10 @@ struct Launch {
     std::string program;                     // default: the installed launcher
     int user = -1;                           // run as this uid and gid (root only)
     long killAfterUs = -1;                   // SIGKILL the launcher after this delay
-    int children = -1;                       // children to wait for; -1: one when the launcher exits 0
 };
 
 struct Result {
-    std::vector<int> statuses;    // per launcher: exit status or 128 + signal (killed after two minutes)
-    int status = -1;              // the first launcher's
+    int status = -1;              // of the first launcher: exit status or 128 + signal (killed after two minutes)
     std::vector<Child> children;  // every child that recorded, in no particular order
     std::string log;              // <the first child's -data, else the default workspace>/logs/rcplauncher.log
     std::string tmpLog;           // entry(kTmpLog) after the run
@@ -128,8 +126,9 @@ struct Sandbox {
     }
     void installStub(const std::string& where) const { write(where, readText(RCP_STUB_CHILD), 0755); }
     // Starts the launchers together (each waits at a gate until the last is
-    // forked), waits for them, for the record of every child they started,
-    // and then ends and reaps those children.
+    // forked), waits for them, for the record of the child of each one that
+    // exited 0 and was not killed (and of any other child that recorded
+    // meanwhile), and then ends and reaps every child.
     Result runMany(const std::vector<Launch>& launches);
     Result run(const Launch& launch = {}) { return runMany({launch}); }
 
