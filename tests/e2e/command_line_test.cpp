@@ -1,8 +1,6 @@
 // The exact command line and environment that the child receives, for every
-// install configuration that a launch can be in (the multi-user service's
-// own start included), and how the effective arguments ('-config NAME'
-// extensions, "-debug", "-console", "-restart", "-rcpLauncherWait") shape the
-// child and the launcher's own behaviour.
+// install configuration that a launch can be in, the multi-user service's
+// own start included.
 
 #include "sandbox.h"
 
@@ -11,7 +9,9 @@ using namespace rcptest;
 // Every input that the builders read, for each install configuration: the
 // launcher's own options (passed on, held back or overriding a property),
 // the properties behind each VM argument, system property and -X option, the
-// jvm.properties beside an overriding JVM, and the environment keys. The
+// jvm.properties beside an overriding JVM, the environment keys, and a
+// '-config NAME' extension of the launcher properties (its platform options
+// after the typed ones, its VM options after the typed VM arguments). The
 // child gets exactly this command line and environment, and nothing is
 // logged. (jvm.shareclasses.fullpath names no directory: nothing to empty,
 // nothing to report.)
@@ -19,7 +19,8 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
     for (const std::string configuration : {"user", "lockdown", "serial.multiuser", "multiuser", "userpb", "service"}) {
         SCOPED_TRACE("install.configuration=" + configuration);
         const bool service = configuration == "service";
-        Sandbox sb(configuration, "osgi.splashPath=platform:/base/plugins/splash\nproduct=launcher.product\n",
+        Sandbox sb(configuration, "osgi.splashPath=platform:/base/plugins/splash\nproduct=launcher.product\n"
+                                  "config.x.1=-fromconfig\nconfig.x.2=-vmargs\nconfig.x.3=-Dfromconfig=1\n",
                    "product=install.product\npersonality=pers.one\nplugincustomization=prop.ini\n"
                    "vmfix.noconsole=-Dfix=${workspace.location}\\\\fix\nvmfix.noconsole.2=-Dfix.second=1\n"
                    "vmarg.b=-Dvb=2\nvmarg.a=\nvmarg.0=-Dvzero=0\n-Dempty=\n-Xss=2m\nXbootclasspath.append=/post.jar\n"
@@ -30,17 +31,17 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         const std::string jvm2 = sb.path("inst/jvm2/jre/bin/java"), inst = sb.inst;
         sb.installStub(jvm2);
         sb.write("inst/jvm2/jvm.properties", "-Dfrom.jvm=1\nvmarg.z=-Dvz=1\n");
-        Result r = sb.run({{"-consoleLog", "-plugincustomization", "cmd.ini", "-resetconfig", "-foo", "-vm", jvm2,
-                            "-vmargs", "-Duser.vm=1"},
+        Result r = sb.run({{"-consoleLog", "-plugincustomization", "cmd.ini", "-resetconfig", "-foo", "-config", "x",
+                            "-vm", jvm2, "-vmargs", "-Duser.vm=1"},
                            {{"JAVA_HOME", "/opt/java"}, {"LD_LIBRARY_PATH", "/opt/inherited/lib"}}});
         ASSERT_EQ(r.children.size(), 1u) << r.describe();
 
         const std::string ws = service ? inst + "/eclipse/.workspace" : sb.ws;
-        const V platform = {"-consoleLog", "-plugincustomization", "cmd.ini", "-foo", "-data", ws, "-configuration",
-                            service ? inst + "/eclipse/.config" : sb.cfg, "-application", "com.kel.demo.app",
-                            "-product", "launcher.product", "-personality", "pers.one"};
-        const V vm = {"-Duser.vm=1", "-Dfix=" + ws + "/fix", "-Dvmarg.one=1", "-Dvb=2", "-Dvzero=0", "-Dvz=1",
-                      "-Drcp.home=" + inst, "-Drcp.data=" + ws, "-Dosgi.splashPath=platform:/base/plugins/splash",
+        const V platform = {"-consoleLog", "-plugincustomization", "cmd.ini", "-foo", "-fromconfig", "-data", ws,
+                            "-configuration", service ? inst + "/eclipse/.config" : sb.cfg, "-application",
+                            "com.kel.demo.app", "-product", "launcher.product", "-personality", "pers.one"};
+        const V vm = {"-Duser.vm=1", "-Dfromconfig=1", "-Dfix=" + ws + "/fix", "-Dvmarg.one=1", "-Dvb=2", "-Dvzero=0",
+                      "-Dvz=1", "-Drcp.home=" + inst, "-Drcp.data=" + ws, "-Dosgi.splashPath=platform:/base/plugins/splash",
                       "-Dcom.kel.rcp.install.id=ID42", "-Drcp.install.config=" + configuration, "-Dbase.prop=one",
                       "-Dempty=", "-Dfrom.jvm=1", "-Drcp.osgi.install.area=" + inst + (service ? "" : "/rcp") + "/eclipse",
                       "-Xmx256m", "-Xss=2m", "-Xbootclasspath/p:" + inst + "/pre.jar", "-Xbootclasspath/a:/post.jar",
@@ -55,7 +56,8 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
 
         // "env.setX..." loses its first 8 characters, the X included; JAVA_HOME goes.
         std::map<std::string, std::string> env = r.child().env;
-        for (const char* harness : {"RCP_STUB_RECORD", "ASAN_OPTIONS", "UBSAN_OPTIONS", "LSAN_OPTIONS"}) env.erase(harness);
+        for (const char* harness : {"RCP_STUB_RECORD", "ASAN_OPTIONS", "UBSAN_OPTIONS", "LSAN_OPTIONS"})
+            env.erase(harness);
         EXPECT_EQ(env, (std::map<std::string, std::string>{
                            {"HOME", sb.home}, {"USER", "tester"}, {"PATH", "/usr/bin:/bin"}, {"LANG", "C.UTF-8"},
                            {"JAVA_HIGH_ZIPFDS", "900"}, {"RCP_DEMO", "hello world"}, {"RCP_COUNTED", "yes"},
@@ -73,8 +75,8 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
 TEST(CommandLine, MultiUserServiceStart) {
     Sandbox sb;  // the installation's own launcher properties are not the service's
     const std::string svc = sb.inst + "/p1/p2/p3/p4", ws = sb.inst + "/eclipse/.muservice";
-    sb.write(svc + "/rcp/rcplauncher.properties", "rcp.install.id=SVC7\nrcp.base.location=${rcp.home}/base\n"
-                                                  "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=multiuser\n");
+    sb.write(svc + "/rcp/rcplauncher.properties", "rcp.install.id=SVC7\nrcp.base.location=${rcp.home}/base\njvm.location="
+                                                  "${rcp.home}/jre/bin/java\ninstall.configuration=multiuser\n");
     sb.installLauncher(svc + "/p5/p6/rcplauncher");
     Result r = sb.run({{"-foo", "-initMUService", "-debug"}, {}, svc + "/p5/p6/rcplauncher"});
     EXPECT_EQ(r.child().argv,
@@ -89,57 +91,4 @@ TEST(CommandLine, MultiUserServiceStart) {
                                       ".rcp.lock", "logs/", "logs/rcplauncher.log"}));
     EXPECT_LT(r.log.find("RLNCH0043I: UserName: muservice\n"),
               r.log.find("RLNCH0132I: ===== Begin Parameters =====\n" + sb.jvm + "\n-Dvmarg.one=1\n"));
-}
-
-// The effective arguments are the typed ones plus the '-config NAME'
-// extensions of the launcher properties (platform options before the typed
-// "-vmargs", VM options after the typed VM arguments). On them depend: debug
-// output ("-debug", even from the properties; never on a restart), the
-// console fix (left out with "-console" unless restarting), and whether the
-// launcher stays until its platform ends ("-rcpLauncherWait" or "-console",
-// not on a restart); a launcher that waited exits 0 whatever the platform's
-// status. Without library path keys the inherited LD_LIBRARY_PATH reaches
-// the child unchanged. A JVM named with "-vm" brings the jvm.properties three
-// levels above it, also when named with backslashes; "-vm" without a value
-// leaves the installation's JVM. The platform lives a second: long enough
-// that a launcher which does not wait cannot have reaped it.
-TEST(CommandLine, EffectiveArguments) {
-    // typed arguments; the child's platform options, "|", and its VM arguments before the configured one;
-    // debug output; the launcher waits
-    const std::tuple<V, std::string, bool, bool> cases[] = {
-        {{"-config", "x", "-bar", "-vmargs", "-Dv=1"}, "-bar -foo | -Dv=1 -Xmx1g -Dfix", false, false},
-        {{"-bar", "-config", "x"}, "-bar -foo | -Xmx1g -Dfix", false, false},
-        {{"-config", "nothing", "-bar"}, "-bar | -Dfix", false, false},
-        {{"-config", "dbg"}, "-debug | -Dfix", true, false},
-        {{"-debug"}, "-debug | -Dfix", true, false},
-        {{"-restart", "-config", "dbg"}, "| -Dfix", false, false},
-        {{"-console", "-debug"}, "-console -debug |", true, true},
-        {{"-config", "con"}, "-console |", false, true},
-        {{"-rcpLauncherWait"}, "-rcpLauncherWait | -Dfix", false, true},
-        {{"-restart", "-console", "-debug"}, "| -Dfix", false, false},
-        {{"-restart", "-rcpLauncherWait"}, "-rcpLauncherWait | -Dfix", false, true},
-        {{"-consoleLog"}, "-consoleLog | -Dfix", false, false},
-        {{"-vm", "k\\jre\\bin\\java"}, "| -Dfix", false, false},
-        {{"-vm"}, "| -Dfix", false, false},
-    };
-    Sandbox sb("user", "config.x.1=-foo\nconfig.x.2=-vmargs\nconfig.x.3=-Xmx1g\nconfig.dbg.1=-debug\nconfig.con.1=-console\n",
-               "vmfix.noconsole=-Dfix\n");
-    sb.write("k/jvm.properties", "-Dk=1\n");
-    for (const auto& [args, expected, debug, waits] : cases) {
-        SCOPED_TRACE(::testing::PrintToString(args));
-        Result r = sb.run({args, {{"RCP_STUB_SLEEP", "1"}, {"RCP_STUB_EXIT", "7"}, {"LD_LIBRARY_PATH", "/opt/lib"}}});
-        const Child& c = r.child();
-        const int data = c.index("-data"), vmargs = c.index("-vmargs"), configured = c.index("-Dvmarg.one=1");
-        ASSERT_TRUE(r.status == 0 && data > 0 && vmargs > data && configured > vmargs) << r.describe();
-        std::string shown;
-        for (int i = 1; i < configured; i++) shown += i < data || i > vmargs ? " " + c.argv[i] : i == data ? " |" : "";
-        EXPECT_EQ(shown.substr(1), expected);
-        EXPECT_EQ(c.argv.back(), "-XstartOnFirstThread");
-        EXPECT_EQ(c.env.at("LD_LIBRARY_PATH"), "/opt/lib");
-        EXPECT_EQ(r.log.find("RLNCH0132I: ===== Begin Parameters =====") != std::string::npos, debug) << r.log;
-        EXPECT_EQ(c.reapedByLauncher, waits);
-        const bool k = args.size() == 2 && args[0] == "-vm";
-        EXPECT_EQ(c.after("-vm"), k ? args[1] : sb.jvm);
-        EXPECT_EQ(c.index("-Dk=1") != -1, k);
-    }
 }

@@ -26,7 +26,7 @@ TEST(Concurrency, ManyLaunchersAtOnceMakeOneMainProcess) {
     for (int round = 0; round <= rounds; round++) {
         SCOPED_TRACE("round " + std::to_string(round));
         if (round > 0) sb.freshHome();
-        Result r = sb.runMany(std::vector<Launch>(32, Launch({}, {{"RCP_STUB_SLEEP", "300"}})));
+        Result r = sb.runMany(std::vector<Launch>(32, Launch{{}, {{"RCP_STUB_SLEEP", "300"}}}));
         ASSERT_EQ(r.children.size(), 32u) << r.describe();
         EXPECT_EQ(r.tmpLog, "");
         EXPECT_EQ(r.log.find("RLNCH"), std::string::npos) << r.log;

@@ -62,14 +62,9 @@ static Prepare special(std::string at, std::string target) {
         ASSERT_EQ(to.empty() ? mkfifo(path.c_str(), 0644) : symlink(to.c_str(), path.c_str()), 0);
     };
 }
-// The path (and with tree everything below it) handed to another owner.
-static Prepare own(std::string at, int uid, bool tree = false) {
-    return [=](Sandbox& sb, Launch&) {
-        const std::string path = expand(sb, at);
-        for (const std::string& rel : tree ? names(snapshot(path)) : V{})
-            ASSERT_EQ(lchown((path + "/" + rel).c_str(), uid, uid), 0) << rel;
-        ASSERT_EQ(lchown(path.c_str(), uid, uid), 0);
-    };
+// The path handed to another owner.
+static Prepare own(std::string at, int uid) {
+    return [=](Sandbox& sb, Launch&) { ASSERT_EQ(lchown(expand(sb, at).c_str(), uid, uid), 0) << at; };
 }
 
 // The launch ends with status 255, no child and its message as the last
@@ -82,7 +77,7 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
     const std::string load = "RLNCH0014E: Unable to load ", noRcp = load + "/rcp/rcplauncher.properties file!";
     const std::string unknown = "RLNCH0025E: The platform rcp.install.id must be provided for this configuration!";
     const std::string lock = "RLNCH0054E: Error locating platform lock file";
-    const Prepare debug = args({"-debug"}), firstLaunch = [](Sandbox& sb, Launch&) { ASSERT_EQ(sb.run().status, 0); };
+    const Prepare debug = args({"-debug"});
     auto props = [&](const std::string& text) { return steps({file("%P", text), debug}); };
     // A launcher outside a directory named exactly "rcp" has an empty
     // installation directory, so it looks for /rcp/rcplauncher.properties,
@@ -92,10 +87,11 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
         return steps({file("%S/" + dir + "/rcplauncher.properties", launcherProps("user")), args(a),
                       [dir](Sandbox& sb, Launch& o) { sb.installLauncher(o.program = sb.path(dir + "/rcplauncher")); }});
     };
-    // A reset after a first launch; for nobody, the workspace directory is
-    // root's (not writable for others) while all in it is nobody's.
-    const Prepare reset = steps({firstLaunch, args({"-resetconfig"})});
-    const Prepare locked = steps({reset, own("%W", kNobody, true), own("%W", 0)});
+    // A reset after a first launch by the same user; for nobody, the
+    // workspace directory is then root's (not writable for others) while all
+    // in it is nobody's.
+    const Prepare reset = steps({[](Sandbox& sb, Launch& o) { ASSERT_EQ(sb.run(o).status, 0); }, args({"-resetconfig"})});
+    const Prepare locked = steps({own("%H", kNobody), reset, own("%W", 0)});
     // Before a fallback log is planted: launcher properties without the base
     // location, so that the launch ends before its log directory is known,
     // and "-debug" with more queued than a pipe holds.
@@ -141,7 +137,7 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
         {"workspace not writable", 2, true, dir("%W"), create + "%W/logs directory.", EACCES},
         {"lock file is a directory", 0, false, dir("%W/.rcp.lock"), lock, EISDIR},
         {"configuration area is a file", 0, false, file("%C"), create + "%C directory.", EEXIST},
-        {"configuration area not writable", 2, false, steps({dir("%C"), dir("%W/logs"), own("%W", kNobody, true), own("%C", 0)}),
+        {"configuration area not writable", 2, false, steps({dir("%C"), dir("%W/logs"), own("%W", kNobody), own("%W/logs", kNobody)}),
          "RLNCH0019E: Could not open %C/args.properties for writing!", EACCES},
         // In a workspace other users may write, the lock file could be a
         // link to anything: it is never followed, so nothing is created or
@@ -239,7 +235,7 @@ TEST(Faults, PreloadLinkIsOnlyEverOurOwn) {
         if (who > 0 && notRoot(name)) continue;
         sb.freshHome();
         sb.write(victim, "someone else's file\n", 0666);
-        Launch o({}, {{"USER", user}});
+        Launch o{{}, {{"USER", user}}};
         o.user = who == 2 ? kNobody : -1;
         plant(sb, o);
         const std::string planted = entry(link);

@@ -24,9 +24,8 @@ std::string entry(const std::string& path) {
     if (lstat(path.c_str(), &st) != 0) return "";
     const std::string owner = "uid " + std::to_string(st.st_uid);
     if (S_ISLNK(st.st_mode)) return owner + " link -> " + fs::read_symlink(path).string();
-    // A large file (a copy of the launcher) is known by its size and time.
-    if (S_ISREG(st.st_mode) && st.st_size > (1 << 20))
-        return owner + " file of " + std::to_string(st.st_size) + " bytes from " + std::to_string(st.st_mtime);
+    // A large file (a copy of the launcher) is known by its size.
+    if (S_ISREG(st.st_mode) && st.st_size > (1 << 20)) return owner + " file of " + std::to_string(st.st_size) + " B";
     if (S_ISREG(st.st_mode)) return owner + " file\n" + readText(path);
     return owner + (S_ISDIR(st.st_mode) ? " dir" : " special");
 }
@@ -92,8 +91,8 @@ std::vector<Child> records(const std::string& dir) {
         Child c;
         c.pid = std::stol(file.path().filename().string());
         std::string field;
-        std::getline(in, field, '\0');
-        for (long argc = std::stol(field); argc > 0 && std::getline(in, field, '\0'); argc--) c.argv.push_back(field);
+        for (long n = std::getline(in, field, '\0') ? std::stol(field) : 0; n > 0 && std::getline(in, field, '\0'); n--)
+            c.argv.push_back(field);
         while (std::getline(in, field, '\0')) c.env[field.substr(0, field.find('='))] = field.substr(field.find('=') + 1);
         out.push_back(c);
     }
@@ -113,15 +112,14 @@ Result Sandbox::runMany(const std::vector<Launch>& launches) {
     std::vector<pid_t> pids;
     for (const Launch& l : launches) {
         // env -i: exactly this environment (the sanitizer settings of the
-        // test run apply to the launcher as well), and a wrapper without a
-        // slash is found on the sandbox's PATH.
-        std::map<std::string, std::string> env = l.env;
-        env.insert({{"HOME", home}, {"USER", "tester"}, {"PATH", "/usr/bin:/bin"}, {"LANG", "C.UTF-8"},
-                    {"RCP_STUB_RECORD", recordDir}});
-        for (const char* name : {"ASAN_OPTIONS", "UBSAN_OPTIONS", "LSAN_OPTIONS"})
-            if (getenv(name)) env.insert({name, getenv(name)});
-        std::vector<std::string> args = {"/usr/bin/env", "-i"};
-        for (const auto& kv : env) args.push_back(kv.first + "=" + kv.second);
+        // test run apply to the launcher as well; the launch's own settings
+        // come last and win), and a wrapper without a slash is found on the
+        // sandbox's PATH.
+        V args = {"/usr/bin/env", "-i", "HOME=" + home, "USER=tester", "PATH=/usr/bin:/bin", "LANG=C.UTF-8",
+                  "RCP_STUB_RECORD=" + recordDir};
+        for (const std::string name : {"ASAN_OPTIONS", "UBSAN_OPTIONS", "LSAN_OPTIONS"})
+            if (getenv(name.c_str())) args.push_back(name + "=" + getenv(name.c_str()));
+        for (const auto& kv : l.env) args.push_back(kv.first + "=" + kv.second);
         std::istringstream wrapper(getenv("RCP_LAUNCHER_WRAPPER") ? getenv("RCP_LAUNCHER_WRAPPER") : "");
         args.insert(args.end(), std::istream_iterator<std::string>(wrapper), {});
         args.push_back(l.program.empty() ? launcher : l.program);

@@ -51,7 +51,7 @@ inline std::string launcherProps(const std::string& configuration) {
 }
 // True, after saying so, when the test does not run as root: only root can
 // run the launcher as another user or plant another user's files.
-inline bool notRoot(const std::string& what) { return geteuid() && std::cout << "skipped (needs root): " << what << "\n"; }
+inline bool notRoot(const std::string& what) { return geteuid() && std::cout << "skipped (needs root): " << what << '\n'; }
 
 // What lies at a path, as text: owner, kind, and a link's target or a regular
 // file's bytes ("" when nothing is there). Nothing else is ever opened, so a
@@ -62,12 +62,9 @@ std::string entry(const std::string& path);
 // and the kind count.
 using Tree = std::map<std::string, std::string>;
 Tree snapshot(const std::string& root);
-inline V names(const Tree& tree) {
-    V out;
-    for (const auto& e : tree) out.push_back(e.first);
-    return out;
-}
-inline std::string lastLine(std::string log) {  // the last one that is not empty
+inline V names(const Tree& tree) { V out; for (const auto& e : tree) out.push_back(e.first); return out; }
+// The last line that is not empty.
+inline std::string lastLine(std::string log) {
     while (!log.empty() && log.back() == '\n') log.pop_back();
     return log.substr(log.rfind('\n') + 1);
 }
@@ -79,23 +76,20 @@ struct Child {
     bool reapedByLauncher = false;  // the launcher waited for it
     // The index of arg (-1 when absent) and the argument after it ("" when none).
     int index(const std::string& arg) const {
-        const auto it = std::find(argv.begin(), argv.end(), arg);
-        return it == argv.end() ? -1 : static_cast<int>(it - argv.begin());
+        const auto at = std::find(argv.begin(), argv.end(), arg) - argv.begin();
+        return at < static_cast<long>(argv.size()) ? static_cast<int>(at) : -1;
     }
     std::string after(const std::string& arg) const {
-        const size_t i = static_cast<size_t>(index(arg) + 1);
-        return i > 0 && i < argv.size() ? argv[i] : "";
+        return index(arg) >= 0 && index(arg) + 1u < argv.size() ? argv[index(arg) + 1u] : "";
     }
 };
 
 struct Launch {
-    Launch(std::vector<std::string> a = {}, std::map<std::string, std::string> e = {}, std::string p = "")
-        : args(a), env(e), program(p) {}
-    std::vector<std::string> args;           // after argv[0]
-    std::map<std::string, std::string> env;  // added to or replacing the sandbox's
-    std::string program;                     // default: the installed launcher
-    int user = -1;                           // run as this uid and gid (root only)
-    long killAfterUs = -1;                   // SIGKILL the launcher after this delay
+    V args = {};                                  // after argv[0]
+    std::map<std::string, std::string> env = {};  // added to or replacing the sandbox's
+    std::string program = "";                     // "": the installed launcher
+    int user = -1;                                // run as this uid and gid (root only)
+    long killAfterUs = -1;                        // SIGKILL the launcher after this delay
 };
 
 struct Result {
@@ -122,7 +116,8 @@ struct Sandbox {
         writeText(where[0] == '/' ? where : path(where), text, mode);
     }
     void installLauncher(const std::string& where) const {
-        write(where, readText(getenv("RCP_LAUNCHER_BINARY") ? getenv("RCP_LAUNCHER_BINARY") : RCP_LAUNCHER_BINARY), 0755);
+        const char* binary = getenv("RCP_LAUNCHER_BINARY");
+        write(where, readText(binary ? binary : RCP_LAUNCHER_BINARY), 0755);
     }
     void installStub(const std::string& where) const { write(where, readText(RCP_STUB_CHILD), 0755); }
     // Starts the launchers together (each waits at a gate until the last is
