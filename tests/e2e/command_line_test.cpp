@@ -19,7 +19,8 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
     for (const std::string configuration : {"user", "lockdown", "serial.multiuser", "multiuser", "userpb", "service"}) {
         SCOPED_TRACE("install.configuration=" + configuration);
         const bool service = configuration == "service";
-        Sandbox sb(configuration, "osgi.splashPath=platform:/base/plugins/splash\nproduct=launcher.product\n"
+        const std::string splash = "platform:/base/plugins/splash";
+        Sandbox sb(configuration, "osgi.splashPath=" + splash + "\nproduct=launcher.product\n"
                                   "config.x.1=-fromconfig\nconfig.x.2=-vmargs\nconfig.x.3=-Dfromconfig=1\n",
                    "product=install.product\npersonality=pers.one\nplugincustomization=prop.ini\n"
                    "vmfix.noconsole=-Dfix=${workspace.location}\\\\fix\nvmfix.noconsole.2=-Dfix.second=1\n"
@@ -36,14 +37,14 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
                            {{"JAVA_HOME", "/opt/java"}, {"LD_LIBRARY_PATH", "/opt/inherited/lib"}}});
         ASSERT_EQ(r.children.size(), 1u) << r.describe();
 
-        const std::string ws = service ? inst + "/eclipse/.workspace" : sb.ws;
+        const std::string ws = service ? inst + "/eclipse/.workspace" : sb.ws, area = service ? "" : "/rcp";
         const V platform = {"-consoleLog", "-plugincustomization", "cmd.ini", "-foo", "-fromconfig", "-data", ws,
                             "-configuration", service ? inst + "/eclipse/.config" : sb.cfg, "-application",
                             "com.kel.demo.app", "-product", "launcher.product", "-personality", "pers.one"};
         const V vm = {"-Duser.vm=1", "-Dfromconfig=1", "-Dfix=" + ws + "/fix", "-Dvmarg.one=1", "-Dvb=2", "-Dvzero=0",
-                      "-Dvz=1", "-Drcp.home=" + inst, "-Drcp.data=" + ws, "-Dosgi.splashPath=platform:/base/plugins/splash",
+                      "-Dvz=1", "-Drcp.home=" + inst, "-Drcp.data=" + ws, "-Dosgi.splashPath=" + splash,
                       "-Dcom.kel.rcp.install.id=ID42", "-Drcp.install.config=" + configuration, "-Dbase.prop=one",
-                      "-Dempty=", "-Dfrom.jvm=1", "-Drcp.osgi.install.area=" + inst + (service ? "" : "/rcp") + "/eclipse",
+                      "-Dempty=", "-Dfrom.jvm=1", "-Drcp.osgi.install.area=" + inst + area + "/eclipse",
                       "-Xmx256m", "-Xss=2m", "-Xbootclasspath/p:" + inst + "/pre.jar", "-Xbootclasspath/a:/post.jar",
                       "-cp", inst + "/lib/boot.jar"};
         V expected = {service ? jvm2 : sb.eclipse};
@@ -75,8 +76,9 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
 TEST(CommandLine, MultiUserServiceStart) {
     Sandbox sb;  // the installation's own launcher properties are not the service's
     const std::string svc = sb.inst + "/p1/p2/p3/p4", ws = sb.inst + "/eclipse/.muservice";
-    sb.write(svc + "/rcp/rcplauncher.properties", "rcp.install.id=SVC7\nrcp.base.location=${rcp.home}/base\njvm.location="
-                                                  "${rcp.home}/jre/bin/java\ninstall.configuration=multiuser\n");
+    sb.write(svc + "/rcp/rcplauncher.properties",
+             "rcp.install.id=SVC7\nrcp.base.location=${rcp.home}/base\njvm.location=${rcp.home}/jre/bin/java\n"
+             "install.configuration=multiuser\n");
     sb.installLauncher(svc + "/p5/p6/rcplauncher");
     Result r = sb.run({{"-foo", "-initMUService", "-debug"}, {}, svc + "/p5/p6/rcplauncher"});
     EXPECT_EQ(r.child().argv,

@@ -90,10 +90,10 @@ std::vector<Child> records(const std::string& dir) {
         std::istringstream in(readText(file.path().string()));
         Child c;
         c.pid = std::stol(file.path().filename().string());
-        std::string field;
-        for (long n = std::getline(in, field, '\0') ? std::stol(field) : 0; n > 0 && std::getline(in, field, '\0'); n--)
-            c.argv.push_back(field);
-        while (std::getline(in, field, '\0')) c.env[field.substr(0, field.find('='))] = field.substr(field.find('=') + 1);
+        std::string f;
+        for (long n = std::getline(in, f, '\0') ? std::stol(f) : 0; n > 0 && std::getline(in, f, '\0'); n--)
+            c.argv.push_back(f);
+        while (std::getline(in, f, '\0')) c.env[f.substr(0, f.find('='))] = f.substr(f.find('=') + 1);
         out.push_back(c);
     }
     return out;
@@ -169,7 +169,7 @@ Result Sandbox::runMany(const std::vector<Launch>& launches) {
     // be loaded; the launcher itself writes nothing to the terminal.
     std::istringstream out(readText(terminal));
     for (std::string line; std::getline(out, line);)
-        if (line.find("from LD_PRELOAD cannot be preloaded") == std::string::npos) ADD_FAILURE() << "terminal: " << line;
+        if (line.find("from LD_PRELOAD cannot be preloaded") == std::string::npos) ADD_FAILURE() << "output: " << line;
     res.tmpLog = entry(kTmpLog);
     unlink(kTmpLog);
     const std::string data = res.child().after("-data");

@@ -51,7 +51,7 @@ inline std::string launcherProps(const std::string& configuration) {
 }
 // True, after saying so, when the test does not run as root: only root can
 // run the launcher as another user or plant another user's files.
-inline bool notRoot(const std::string& what) { return geteuid() && std::cout << "skipped (needs root): " << what << '\n'; }
+inline bool notRoot(const std::string& why) { return geteuid() && std::cout << "skipped, needs root: " << why << '\n'; }
 
 // What lies at a path, as text: owner, kind, and a link's target or a regular
 // file's bytes ("" when nothing is there). Nothing else is ever opened, so a
