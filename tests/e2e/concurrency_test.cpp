@@ -1,8 +1,6 @@
 // The platform lock between launchers of one workspace: many launchers
 // started at the same moment make exactly one main process, and a launcher
 // that restarts the platform waits for the one it replaces.
-#include <sys/wait.h>
-
 #include <chrono>
 #include <thread>
 
@@ -41,7 +39,8 @@ TEST(Concurrency, ManyLaunchersAtOnceMakeOneMainProcess) {
 // "-restart". That launcher gives the old platform time to end: it proceeds
 // as soon as the recorded process is gone, or after about 20 seconds
 // declares it stale and goes on as the main launcher anyway. Either way the
-// new platform is a main one, never interactive (its own platform stays up,
+// new platform is a main one (a '-config NAME' extension without typed VM
+// arguments follows the typed options), never interactive (its own platform stays up,
 // so a launcher that waited for it because of "-console" would run into its
 // time limit), the startup record is the restarted launcher's without the
 // "-restart" the platform added, and the restarted launcher writes no debug
@@ -53,7 +52,7 @@ TEST(Concurrency, ManyLaunchersAtOnceMakeOneMainProcess) {
 TEST(Concurrency, RestartWaitsForThePlatformItReplaces) {
     for (const bool oldEnds : {true, false}) {
         SCOPED_TRACE(oldEnds ? "old platform ends during the wait" : "old platform keeps running");
-        Sandbox sb;
+        Sandbox sb("user", "config.s.1=-fromconfig\n");
         ASSERT_NE(lastLine(sb.run({{"-debug"}}).log), "");
         pid_t old = getpid();
         if (oldEnds && (old = fork()) == 0) {
@@ -63,7 +62,7 @@ TEST(Concurrency, RestartWaitsForThePlatformItReplaces) {
         std::thread reaper([=] { return oldEnds && waitpid(old, nullptr, 0) == old; });
         sb.write(sb.ws + "/.rcp.lock", std::to_string(old));
         const auto start = std::chrono::steady_clock::now();
-        Result r = sb.run({{"-restart", "-debug", "-console", "-second"}, {{"RCP_STUB_SLEEP", "600"}}});
+        Result r = sb.run({{"-restart", "-debug", "-console", "-config", "s", "-second"}, {{"RCP_STUB_SLEEP", "600"}}});
         const auto ms = std::chrono::duration_cast<std::chrono::milliseconds>(std::chrono::steady_clock::now() - start);
         reaper.join();
         ASSERT_EQ(r.children.size(), 1u) << r.describe();
@@ -71,8 +70,9 @@ TEST(Concurrency, RestartWaitsForThePlatformItReplaces) {
             << ms.count() << " ms";
         for (const char* absent : {"-useDaemon", "-debug", "-console", "-restart"})
             EXPECT_EQ(r.child().index(absent), -1) << absent;
+        EXPECT_EQ(r.child().after("-second"), "-fromconfig");
         EXPECT_EQ(readText(sb.cfg + "/args.properties"),
-                  "arg0=" + sb.launcher + "\narg1=-debug\narg2=-console\narg3=-second\nargc=4\n");
+                  "arg0=" + sb.launcher + "\narg1=-debug\narg2=-console\narg3=-config\narg4=s\narg5=-second\nargc=6\n");
         EXPECT_EQ(lastLine(r.log) + r.tmpLog, "") << r.describe();
     }
 }

@@ -20,15 +20,10 @@
 // be on, so the /tmp cases hold either way: a link planted by the owner of
 // /tmp (root) is followed by the kernel for every user, and root itself may
 // remove any entry.
-#include <signal.h>
 #include <sys/mount.h>
-#include <sys/stat.h>
 #include <sys/statvfs.h>
 
-#include <cerrno>
 #include <chrono>
-#include <cstring>
-#include <functional>
 #include <memory>
 #include <random>
 
@@ -289,10 +284,9 @@ TEST(Faults, InterruptedFirstLaunchesLeaveAUsableArea) {
     for (int round = 0; round < (rounds ? atoi(rounds) : 10) && !::testing::Test::HasFailure(); round++) {
         sb.freshHome();
         sb.write(sb.home + "/notes.txt", "the user's own file\n");
-        if (round % 2 == 1) {  // a workspace that holds the user's data, without a configuration area yet
-            sb.write(sb.ws + "/project/a.txt", "project file\n");
-            sb.write(sb.ws + "/.metadata/.plugins/org.x/state", "plug-in state\n");
-        }
+        // Every other round a workspace that holds the user's data, without a configuration area yet.
+        for (const char* f : {"/project/a.txt", "/.metadata/.plugins/org.x/state"})
+            if (round % 2 == 1) sb.write(sb.ws + f, "the user's data\n");
         const Tree before = snapshot(sb.home);
         Launch killed;
         killed.killAfterUs = delay(rng);

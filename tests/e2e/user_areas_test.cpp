@@ -20,7 +20,8 @@ using namespace rcptest;
 // installation's copies changed in between, and rewrites its log and startup
 // record however long the earlier text was (without "-debug" the log is just
 // the empty line that closes the empty queue); a "-resetconfig" that comes
-// from the launcher properties is no request to reset. Only one typed on the
+// from the launcher properties is no request to reset, and with "-console"
+// the launcher stays until its platform ends. Only one typed on the
 // command line resets: the configuration area goes to its backup, the
 // listed plug-in state directories go, and the files come back from the
 // installation's copies. A configuration area written by another
@@ -72,10 +73,10 @@ TEST(UserAreas, LifeOfAWorkspace) {
     Tree before = snapshot(ws);
     for (const char* f : {"/config.ini", "/platform.xml", "/rcpinstall.properties"}) sb.write(sb.base + f, "new=1\n");
     sb.write(sb.props, launcherProps("user") + "config.rs.1=-resetconfig\ncom.kel.rcp.core.bidi=true\n");
-    r = sb.run({{"-config", "rs"}, {}, sb.path("links/inst/rcp/rcplauncher")});
-    EXPECT_NE(r.child().index("-Drcp.home=" + sb.inst), -1) << r.describe();
+    r = sb.run({{"-config", "rs", "-console"}, {}, sb.path("links/inst/rcp/rcplauncher")});
+    EXPECT_TRUE(r.child().index("-Drcp.home=" + sb.inst) != -1 && r.child().reapedByLauncher) << r.describe();
     before[".config/args.properties"] = "uid " + std::to_string(geteuid()) + " file\narg0=" + sb.launcher +
-                                        "\narg1=-config\narg2=rs\nargc=3\n";
+                                        "\narg1=-config\narg2=rs\narg3=-console\nargc=4\n";
     EXPECT_EQ(snapshot(ws), before);
     EXPECT_EQ(r.log, "\n");
 

@@ -2,15 +2,10 @@
 
 #include <fcntl.h>
 #include <grp.h>
-#include <gtest/gtest.h>
-#include <signal.h>
-#include <sys/stat.h>
-#include <sys/wait.h>
 #ifdef __linux__
 #include <sys/prctl.h>
 #endif
 
-#include <cerrno>
 #include <filesystem>
 #include <iterator>
 #include <sstream>

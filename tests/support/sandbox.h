@@ -24,9 +24,15 @@
 #define RCP_SANDBOX_H
 
 #include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <functional>
 #include <iostream>
 #include <map>
 #include <string>
