@@ -1,119 +1,78 @@
-// Many launchers of one user started at the same moment on one workspace:
-// the platform lock must let exactly one of them become the main process
-// while every other one hands over to the platform that one started, and the
-// per-user files must come out as a single launch writes them, whether the
-// race is a later launch or the user's very first one (where the launchers
-// also race to create the workspace, log and configuration directories).
-#include <gtest/gtest.h>
-#include <signal.h>
-#include <sys/types.h>
-
-#include <algorithm>
-#include <cstdlib>
-#include <string>
-#include <vector>
+// The platform lock between launchers of one workspace: many launchers
+// started at the same moment make exactly one main process, and a launcher
+// that restarts the platform waits for the one it replaces.
+#include <chrono>
+#include <thread>
 
 #include "sandbox.h"
-#include "test_util.h"
 
 using namespace rcptest;
 
-namespace {
-
-const int kLaunchers = 32;
-
-const char* const kUserFiles[] = {".config/rcpinstall.properties", ".config/config.ini",
-                                  ".config/org.eclipse.update/platform.xml"};
-
-// Every path below the home directory except the log, which all launchers
-// rewrite at once and whose bytes therefore mean nothing.
-std::vector<std::string> userTree(const std::string& home) {
-    std::vector<std::string> tree = listTree(home);
-    tree.erase(std::remove_if(tree.begin(), tree.end(),
-                              [](const std::string& p) { return p.find("logs/rcplauncher.log") != std::string::npos; }),
-               tree.end());
-    return tree;
-}
-
+// 32 launchers at once: exactly one becomes the main process while every
+// other one hands over to the platform that one started, whether the race is
+// a later launch or the user's very first one (where the launchers also race
+// to create the workspace, log and configuration directories: a directory
+// another launcher just made is no failure). Round 0 races a later launch,
+// the other rounds a first one; that race is a matter of timing, so it runs
+// a few times (RCP_RACE_ROUNDS, default 5). The children outlive the whole
+// race: a platform that ended half-way would rightly make a later launcher
+// main again.
 TEST(Concurrency, ManyLaunchersAtOnceMakeOneMainProcess) {
-    // Round 0 races a later launch; every other round the user's first one
-    // (the race starts in an empty home). That race on the directories is a
-    // matter of timing, so it runs a few times (RCP_RACE_ROUNDS, default 5)
-    // to be seen reliably.
-    const char* roundsText = getenv("RCP_RACE_ROUNDS");
-    const int rounds = roundsText && *roundsText ? atoi(roundsText) : 5;
+    const int rounds = getenv("RCP_RACE_ROUNDS") ? atoi(getenv("RCP_RACE_ROUNDS")) : 5;
+    Sandbox sb;
+    ASSERT_EQ(sb.run().status, 0);
     for (int round = 0; round <= rounds; round++) {
-        const bool firstLaunch = round > 0;
-        SCOPED_TRACE((firstLaunch ? "first launch, round " : "later launch, round ") + std::to_string(round));
-        Sandbox sb;
-        sb.setupInstall("user", "", "resetDir.a=org.x\n");
-        const std::string ws = sb.defaultWorkspace();
-
-        // What one launch writes, in a home of its own: the per-user files
-        // hold no home path, so they must come out byte for byte the same.
-        RunOptions single;
-        single.args = {"-n", "0"};
-        single.env = {{"HOME", sb.path("refhome")}};
-        LaunchResult ref = sb.run(single);
-        ASSERT_EQ(ref.status, 0) << ref.describe();
-        const std::string refWs = sb.path("refhome") + "/KEL/RCP/ID42/tester";
-        if (!firstLaunch) {
-            LaunchResult earlier = sb.run(single);
-            ASSERT_EQ(earlier.status, 0) << earlier.describe();
-        }
-
-        // Every launcher gets its own number, so the startup record tells
-        // which one wrote it. The children outlive the whole race: a platform
-        // that ended half-way would rightly make a later launcher main again.
-        std::vector<RunOptions> runs(kLaunchers);
-        for (int i = 0; i < kLaunchers; i++) {
-            runs[i].args = {"-n", std::to_string(i + 1)};
-            runs[i].env = {{"RCP_STUB_SLEEP", "300"}};
-        }
-        sb.beginRuns();
-        std::vector<pid_t> launchers = sb.startTogether(runs);
-        std::vector<int> statuses;
-        for (pid_t p : launchers) statuses.push_back(sb.waitFor(p, 120));
-        std::vector<ChildRecord> children =
-            sb.collectChildren(static_cast<int>(std::count(statuses.begin(), statuses.end(), 0)), 30);
-        sb.releaseChildren(children, true);
-
-        const std::string failure = "\n--- terminal ---\n" + sb.terminalOutput() + "--- /tmp/rcplauncher.log ---\n" +
-                                    readText(kTmpLog) + "--- workspace log ---\n" +
-                                    readText(ws + "/logs/rcplauncher.log");
-        EXPECT_EQ(statuses, std::vector<int>(kLaunchers, 0)) << failure;
-        ASSERT_EQ(children.size(), static_cast<size_t>(kLaunchers)) << failure;
-        EXPECT_EQ(sb.terminalOutput(), "");
-        EXPECT_FALSE(pathExists(kTmpLog)) << failure;
-        EXPECT_EQ(readText(ws + "/logs/rcplauncher.log").find("RLNCH"), std::string::npos) << failure;
-
-        // Exactly one main child; every other one is handed its process id.
-        auto isMain = [](const ChildRecord& child) { return child.argIndex("-useDaemon") == -1; };
-        ASSERT_EQ(std::count_if(children.begin(), children.end(), isMain), 1) << failure;
-        const ChildRecord& main = *std::find_if(children.begin(), children.end(), isMain);
-        const std::string mainPid = std::to_string(main.pid);
-        for (const auto& child : children) {
-            if (&child == &main) continue;
-            EXPECT_EQ(child.argAfter("-useDaemon"), mainPid) << "child " << child.pid;
-        }
-
-        // The lock names the main child, which still runs, in the exact
-        // format; the record is the main launcher's own.
-        EXPECT_EQ(readText(ws + "/.rcp.lock"), mainPid + std::string(10, ' '));
-        EXPECT_EQ(kill(static_cast<pid_t>(main.pid), 0), 0);
-        const std::string n = main.argAfter("-n");
-        EXPECT_EQ(readText(ws + "/.config/args.properties"),
-                  "arg0=" + sb.launcher() + "\narg1=-n\narg2=" + n + "\nargc=3\n");
-
-        EXPECT_EQ(userTree(sb.home()), userTree(sb.path("refhome")));
-        for (const char* f : kUserFiles) EXPECT_EQ(readText(ws + "/" + f), readText(refWs + "/" + f)) << f;
-
-        sb.killChildren();
-        // With the platform gone, the next launcher is the main one again.
-        LaunchResult after = sb.run(single);
-        ASSERT_EQ(after.status, 0) << after.describe();
-        EXPECT_EQ(after.child().argIndex("-useDaemon"), -1);
+        SCOPED_TRACE("round " + std::to_string(round));
+        if (round > 0) sb.freshHome();
+        Result r = sb.runMany(std::vector<Launch>(32, Launch{{}, {{"RCP_STUB_SLEEP", "300"}}}));
+        ASSERT_EQ(r.children.size(), 32u) << r.describe();
+        EXPECT_EQ(r.tmpLog, "");
+        EXPECT_EQ(r.log.find("RLNCH"), std::string::npos) << r.log;
+        auto isMain = [](const Child& child) { return child.index("-useDaemon") == -1; };
+        ASSERT_EQ(std::count_if(r.children.begin(), r.children.end(), isMain), 1);
+        const std::string mainPid = std::to_string(std::find_if(r.children.begin(), r.children.end(), isMain)->pid);
+        for (const Child& child : r.children) EXPECT_EQ(isMain(child) ? mainPid : child.after("-useDaemon"), mainPid);
     }
 }
 
-}  // namespace
+// The platform asks for a restart by starting a new launcher with
+// "-restart". That launcher gives the old platform time to end: it proceeds
+// as soon as the recorded process is gone, or after about 20 seconds
+// declares it stale and goes on as the main launcher anyway. Either way the
+// new platform is a main one (a '-config NAME' extension without typed VM
+// arguments follows the typed options), never interactive (its own platform stays up,
+// so a launcher that waited for it because of "-console" would run into its
+// time limit), the startup record is the restarted launcher's without the
+// "-restart" the platform added, and the restarted launcher writes no debug
+// output, "-debug" or not: the log of the first launch is gone and nothing
+// else is there, not even the note that the lock file was declared stale.
+// The old platform is a process of this test: one that ends (and is reaped,
+// as its real parent would) after 2 seconds, or the test itself, which
+// outlives the wait.
+TEST(Concurrency, RestartWaitsForThePlatformItReplaces) {
+    for (const bool oldEnds : {true, false}) {
+        SCOPED_TRACE(oldEnds ? "old platform ends during the wait" : "old platform keeps running");
+        Sandbox sb("user", "config.s.1=-fromconfig\n");
+        ASSERT_NE(lastLine(sb.run({{"-debug"}}).log), "");
+        pid_t old = getpid();
+        if (oldEnds && (old = fork()) == 0) {
+            sleep(2);
+            _exit(0);
+        }
+        std::thread reaper([=] { return oldEnds && waitpid(old, nullptr, 0) == old; });
+        sb.write(sb.ws + "/.rcp.lock", std::to_string(old));
+        const auto start = std::chrono::steady_clock::now();
+        Result r = sb.run({{"-restart", "-debug", "-console", "-config", "s", "-second"}, {{"RCP_STUB_SLEEP", "600"}}});
+        const auto ms = std::chrono::duration_cast<std::chrono::milliseconds>(std::chrono::steady_clock::now() - start);
+        reaper.join();
+        ASSERT_EQ(r.children.size(), 1u) << r.describe();
+        EXPECT_TRUE(oldEnds ? ms.count() >= 1900 && ms.count() < 15000 : ms.count() >= 19000 && ms.count() < 45000)
+            << ms.count() << " ms";
+        for (const char* absent : {"-useDaemon", "-debug", "-console", "-restart"})
+            EXPECT_EQ(r.child().index(absent), -1) << absent;
+        EXPECT_EQ(r.child().after("-second"), "-fromconfig");
+        EXPECT_EQ(readText(sb.cfg + "/args.properties"),
+                  "arg0=" + sb.launcher + "\narg1=-debug\narg2=-console\narg3=-config\narg4=s\narg5=-second\nargc=6\n");
+        EXPECT_EQ(lastLine(r.log) + r.tmpLog, "") << r.describe();
+    }
+}

@@ -1,440 +1,338 @@
-// Launches that meet a broken or hostile file system: areas that cannot be
-// written, a read-only launcher properties file that must be appended to, a
-// reset whose backup cannot be made, a full disk, and launchers killed at
-// random moments of a first launch. Each must end with its message and
-// status, never a crash or a hang, and must not lose a file that was there.
+// Launches that cannot go on as planned: early failures (the version report,
+// a launcher outside an "rcp" directory, broken launcher properties, an
+// unknown install configuration), areas that cannot be written, a read-only
+// launcher properties file that must be appended to, a reset whose backup
+// cannot be made, entries another user planted at the two fixed paths in the
+// shared /tmp (the fallback log and the preload link), a full disk, and
+// launchers killed at random moments of a first launch. Each must end with
+// its message and status, never a crash or a hang, and must not lose or
+// change a file that was there.
 //
 // The tests run as root, for whom permission bits mean nothing. What can be
 // simulated without privileges is simulated with the file system's own
 // shapes: a regular file where a directory is expected, a path through a
 // file, a directory where a file is expected, FIFOs, links and devices where
-// files are expected. Where only permissions can do it (an unwritable home, a
-// read-only properties file), the launcher runs as the user "nobody" (the
-// sandbox drops privileges in the forked child); a full disk is a small
-// tmpfs. Those cases are skipped when the tests do not run as root. Not
-// simulated: a rename across file systems and a directory that even root
-// cannot remove (both need immutable attributes or more mounts).
-#include <gtest/gtest.h>
-#include <signal.h>
+// files are expected. Where only permissions can do it, the launcher runs as
+// "nobody"; a full disk is a small tmpfs. Those cases are skipped when the
+// tests do not run as root. Not simulated: a rename across file systems and
+// a directory that even root cannot remove. The kernel's protections for
+// sticky directories (protected_symlinks, protected_regular) may or may not
+// be on, so the /tmp cases hold either way: a link planted by the owner of
+// /tmp (root) is followed by the kernel for every user, and root itself may
+// remove any entry.
 #include <sys/mount.h>
-#include <sys/stat.h>
 #include <sys/statvfs.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
-#include <cerrno>
 #include <chrono>
-#include <cstring>
-#include <functional>
-#include <map>
+#include <memory>
 #include <random>
-#include <set>
-#include <string>
-#include <thread>
-#include <vector>
 
 #include "sandbox.h"
-#include "test_util.h"
 
 using namespace rcptest;
+using Prepare = std::function<void(Sandbox&, Launch&)>;
 
-namespace {
-
-const int kNobody = 65534;
-
-std::string errorLine(const std::string& message, int err) { return message + " : " + strerror(err); }
-
-std::string lastLine(const std::string& log) {
-    std::vector<std::string> lines = logLines(log);
-    return lines.empty() ? "" : lines.back();
-}
-
-// Hands a tree (its root included) to another owner, links included.
-void chownTree(const std::string& root, int uid) {
-    ASSERT_EQ(lchown(root.c_str(), static_cast<uid_t>(uid), static_cast<gid_t>(uid)), 0) << root;
-    for (const auto& rel : listTree(root)) {
-        std::string p = root + "/" + rel;
-        if (!rel.empty() && rel.back() == '/') p.pop_back();
-        ASSERT_EQ(lchown(p.c_str(), static_cast<uid_t>(uid), static_cast<gid_t>(uid)), 0) << p;
-    }
-}
-
-// The regular files below root with their bytes and times, except the log
-// and the lock file, which every launch rewrites by design.
-std::map<std::string, FileState> userFiles(const std::string& root) {
-    std::map<std::string, FileState> files;
-    for (const auto& rel : listTree(root)) {
-        struct stat st;
-        // Only regular files: a link to a device (/dev/full) reads forever.
-        if (lstat((root + "/" + rel).c_str(), &st) != 0 || !S_ISREG(st.st_mode)) continue;
-        if (rel.find("logs/rcplauncher.log") != std::string::npos || rel.find(".rcp.lock") != std::string::npos)
-            continue;
-        files[rel] = fileState(root + "/" + rel);
-    }
-    return files;
-}
-
-void expectKept(const std::map<std::string, FileState>& before, const std::string& root) {
-    for (const auto& f : before) EXPECT_TRUE(fileState(root + "/" + f.first) == f.second) << "changed or lost: " << f.first;
-}
-
-// A broken area, the launch that meets it, and the line it must end with.
-// In the message "%W" stands for the default workspace, "%C" for its
-// configuration area, "%S" for the sandbox root and "%P" for the launcher
-// properties.
-struct Fault {
-    const char* name;
-    bool asNobody;   // needs a user for whom permissions count
-    bool inTmpLog;   // the launch ends before its log directory is known
-    std::function<void(Sandbox&, RunOptions&)> prepare;
-    std::string message;
-    int err;         // the errno the error line reports
-};
-
-const int kAnyErrno = -1;
-
-// A first launch, then "-resetconfig"; for a user, the workspace becomes
-// root's (and not writable for others) while all in it is the user's.
-void resetAfterFirstLaunch(Sandbox& sb, RunOptions& o, bool lockWorkspace) {
-    ASSERT_EQ(sb.run().status, 0);
-    o.args = {"-resetconfig"};
-    if (!lockWorkspace) return;
-    chownTree(sb.defaultWorkspace(), kNobody);
-    ASSERT_EQ(chown(sb.defaultWorkspace().c_str(), 0, 0), 0);
-    ASSERT_EQ(chmod(sb.defaultWorkspace().c_str(), 0755), 0);
-}
-
-std::string expand(std::string text, const Sandbox& sb) {
-    const std::map<std::string, std::string> names = {
-        {"%W", sb.defaultWorkspace()}, {"%C", sb.defaultConfig()}, {"%S", sb.root()}, {"%P", sb.launcherProperties()}};
-    for (const auto& n : names)
-        for (size_t p; (p = text.find(n.first)) != std::string::npos;) text.replace(p, 2, n.second);
+// %W, %C, %H, %S and %P in text: the workspace, its configuration area, the
+// home, the sandbox root and the launcher properties.
+static std::string expand(const Sandbox& sb, std::string text) {
+    const Tree names = {{"%W", sb.ws}, {"%C", sb.cfg}, {"%H", sb.home}, {"%S", sb.root}, {"%P", sb.props}};
+    for (const auto& [name, value] : names)
+        for (size_t at; (at = text.find(name)) != std::string::npos;) text.replace(at, 2, value);
     return text;
 }
 
-TEST(Faults, UnwritableAreasEndWithTheirMessage) {
-    const std::string cannotCreate = "RLNCH0010E: Unable to create ";
-    const std::vector<Fault> faults = {
-        {"home is a regular file", false, true,
-         [](Sandbox& sb, RunOptions&) {
-             removeTree(sb.home());
-             writeText(sb.home(), "not a directory\n");
-         },
-         cannotCreate + "%W directory.", ENOTDIR},
-        // mkdirs reports its last level: the levels below the refused one
-        // are missing.
-        {"home not writable by the user", true, true, [](Sandbox&, RunOptions&) {},
-         cannotCreate + "%W directory.", ENOENT},
-        {"workspace is a regular file", false, true,
-         [](Sandbox& sb, RunOptions& o) {
-             sb.writeFile("wsfile", "user data\n");
-             o.args = {"-data", sb.path("wsfile")};
-         },
-         cannotCreate + "%S/wsfile directory.", EEXIST},
-        {"log directory is a regular file", false, true,
-         [](Sandbox& sb, RunOptions&) { writeText(sb.defaultWorkspace() + "/logs", "x\n"); },
-         cannotCreate + "%W/logs directory.", EEXIST},
-        {"log file is a directory", false, true,
-         [](Sandbox& sb, RunOptions&) { makeDirs(sb.defaultWorkspace() + "/logs/rcplauncher.log"); },
-         "RLNCH0019E: Could not open %W/logs/rcplauncher.log for writing!", EISDIR},
-        {"workspace not writable by the user", true, true,
-         [](Sandbox& sb, RunOptions&) { makeDirs(sb.defaultWorkspace()); }, cannotCreate + "%W/logs directory.",
-         EACCES},
-        {"lock file is a directory", false, false,
-         [](Sandbox& sb, RunOptions&) { makeDirs(sb.defaultWorkspace() + "/.rcp.lock"); },
-         "RLNCH0054E: Error locating platform lock file", EISDIR},
-        {"configuration area is a regular file", false, false,
-         [](Sandbox& sb, RunOptions&) { writeText(sb.defaultConfig(), "x\n"); }, cannotCreate + "%C directory.",
+// The steps that prepare a case; every path and argument goes through expand.
+static Prepare steps(std::vector<Prepare> all) { return [=](Sandbox& sb, Launch& o) { for (auto& s : all) s(sb, o); }; }
+static Prepare args(V a) { return [=](Sandbox& sb, Launch& o) { for (auto& s : a) o.args.push_back(expand(sb, s)); }; }
+static Prepare dir(std::string at) { return [=](Sandbox& sb, Launch&) { makeDirs(expand(sb, at)); }; }
+static Prepare file(std::string at, std::string text = "x\n", int mode = 0644) {
+    return [=](Sandbox& sb, Launch&) { sb.write(expand(sb, at), text, mode); };
+}
+// A symbolic link to target at the path, or a FIFO when target is "".
+static Prepare special(std::string at, std::string target) {
+    return [=](Sandbox& sb, Launch&) {
+        const std::string path = expand(sb, at), to = expand(sb, target);
+        unlink(path.c_str());
+        ASSERT_EQ(to.empty() ? mkfifo(path.c_str(), 0644) : symlink(to.c_str(), path.c_str()), 0);
+    };
+}
+// The path handed to another owner.
+static Prepare own(std::string at, int uid) {
+    return [=](Sandbox& sb, Launch&) { ASSERT_EQ(lchown(expand(sb, at).c_str(), uid, uid), 0) << at; };
+}
+
+// The launch ends with status 255, no child and its message as the last
+// line of the fallback or the user's log (with -debug the queued debug
+// lines come first); every file that was there (under the sandbox root, and
+// a planted fallback log) stays as it was, and a launch that ends before its
+// log directory is known creates nothing in the home.
+TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
+    const std::string create = "RLNCH0010E: Unable to create ", version = "RLNCH0031I:   version = \"2006-06-27\"";
+    const std::string load = "RLNCH0014E: Unable to load ", noRcp = load + "/rcp/rcplauncher.properties file!";
+    const std::string unknown = "RLNCH0025E: The platform rcp.install.id must be provided for this configuration!";
+    const std::string lock = "RLNCH0054E: Error locating platform lock file";
+    const Prepare debug = args({"-debug"});
+    auto props = [&](const std::string& text) { return steps({file("%P", text), debug}); };
+    // A launcher outside a directory named exactly "rcp" has an empty
+    // installation directory, so it looks for /rcp/rcplauncher.properties,
+    // ignoring a valid installation beside it. The service start needs one
+    // six levels below "/".
+    auto launcherIn = [](const std::string& dir, const V& a) {
+        return steps({file("%S/" + dir + "/rcplauncher.properties", launcherProps("user")), args(a),
+                      [=](Sandbox& sb, Launch& o) { sb.installLauncher(o.program = sb.path(dir) + "/rcplauncher"); }});
+    };
+    // A reset after a first launch by the same user; for nobody, the
+    // workspace directory is then root's (not writable for others) while all
+    // in it is nobody's.
+    const Prepare first = [](Sandbox& sb, Launch& o) { ASSERT_EQ(sb.run(o).status, 0); };
+    const Prepare reset = steps({first, args({"-resetconfig"})});
+    const Prepare locked = steps({own("%H", kNobody), reset, own("%W", 0)});
+    // Before a fallback log is planted: launcher properties without the base
+    // location, so that the launch ends before its log directory is known,
+    // and "-debug" with more queued than a pipe holds.
+    const Prepare fallback = steps({file("%P", "rcp.install.id=ID42\n# " + std::string(70000, 'q') + "\n"),
+                                    file("%S/victim", "another file's content\n", 0666), debug});
+    // The case; who: 0 the test's user, 1 needs root to plant, 2 the launcher
+    // runs as nobody; whether it ends before its log directory is known (in
+    // the fallback log); how it is prepared; its message (expanded; "" when a
+    // planted fallback log must stay as it was); the errno its line reports
+    // (-1: any).
+    const std::tuple<const char*, int, bool, Prepare, std::string, int> faults[] = {
+        // "-version", whatever else is on the command line.
+        {"version", 0, true, args({"-version"}), version, -1},
+        {"version with -debug", 0, true, args({"-debug", "-version"}), version, -1},
+        {"version and more", 0, true, args({"-data", "/nonexistent/ws", "-version", "-resetconfig"}), version, -1},
+        {"launcher in bin", 0, true, launcherIn("inst/bin", {}), noRcp, -1},
+        {"launcher in RCP", 0, true, launcherIn("inst/RCP", {}), noRcp, -1},
+        {"launcher in rcpx", 0, true, launcherIn("inst/rcpx", {}), noRcp, -1},
+        {"launcher in xrcp", 0, true, launcherIn("inst/xrcp", {}), noRcp, -1},
+        {"service launcher too shallow", 0, true, launcherIn("x", {"-initMUService"}),
+         "RLNCH0048E: Unable to locate the directory containing %S/x/rcplauncher", -1},
+        {"no launcher properties", 0, true, steps({[](Sandbox& sb, Launch&) { unlink(sb.props.c_str()); }, debug}),
+         load + "%P file!", -1},
+        {"no base location", 0, true, props("rcp.install.id=ID42\njvm.location=/j\ninstall.configuration=user\n"),
+         "RLNCH0050E: rcp.base.location property is missing from %P", -1},
+        {"no install id", 0, true, props("rcp.base.location=${rcp.home}/base\ninstall.configuration=user\n"),
+         "RLNCH0016E: rcp.install.id is required for this configuration!", -1},
+        // A configuration the launcher does not know cannot be named to the
+        // platform, a missing one not written into the per-user properties.
+        {"configuration Lockdown", 0, false, props(launcherProps("Lockdown")), unknown, -1},
+        {"configuration provisioning", 0, false, props(launcherProps("provisioning")), unknown, -1},
+        {"configuration with a tab", 0, false, props(launcherProps("user\t")), unknown, -1},
+        {"no configuration", 0, false, props(launcherProps("")),
+         "RLNCH0008E: Unable to calculate necessary values for user specific rcpinstall.properties file.", -1},
+        {"home is a file", 0, true, steps({[](Sandbox& sb, Launch&) { removeTree(sb.home); }, file("%H")}),
+         create + "%W directory.", ENOTDIR},
+        // mkdirs reports its last level: the levels below the refused one are missing.
+        {"home not writable", 2, true, steps({}), create + "%W directory.", ENOENT},
+        {"workspace is a file", 0, true, steps({file("%H/f"), args({"-data", "%H/f"})}), create + "%H/f directory.",
          EEXIST},
-        {"configuration area not writable by the user", true, false,
-         [](Sandbox& sb, RunOptions&) {
-             makeDirs(sb.defaultConfig());
-             makeDirs(sb.defaultWorkspace() + "/logs");
-             chownTree(sb.defaultWorkspace(), kNobody);
-             ASSERT_EQ(chown(sb.defaultConfig().c_str(), 0, 0), 0);
-         },
+        {"log directory is a file", 0, true, file("%W/logs"), create + "%W/logs directory.", EEXIST},
+        {"log file is a directory", 0, true, dir("%W/logs/rcplauncher.log"),
+         "RLNCH0019E: Could not open %W/logs/rcplauncher.log for writing!", EISDIR},
+        {"workspace not writable", 2, true, dir("%W"), create + "%W/logs directory.", EACCES},
+        {"lock file is a directory", 0, false, dir("%W/.rcp.lock"), lock, EISDIR},
+        {"configuration area is a file", 0, false, file("%C"), create + "%C directory.", EEXIST},
+        {"configuration area not writable", 2, false,
+         steps({dir("%C"), dir("%W/logs"), own("%W", kNobody), own("%W/logs", kNobody)}),
          "RLNCH0019E: Could not open %C/args.properties for writing!", EACCES},
         // In a workspace other users may write, the lock file could be a
         // link to anything: it is never followed, so nothing is created or
-        // overwritten where it points (the file starts with a digit, as a
+        // overwritten where it points (a file starting with a digit, as a
         // lock file would).
-        {"lock file is a link to another file", false, false,
-         [](Sandbox& sb, RunOptions&) {
-             writeText(sb.home() + "/victim", "1234 first line\n");
-             makeDirs(sb.defaultWorkspace());
-             ASSERT_EQ(symlink((sb.home() + "/victim").c_str(), (sb.defaultWorkspace() + "/.rcp.lock").c_str()), 0);
-         },
-         "RLNCH0054E: Error locating platform lock file", ELOOP},
+        {"lock file is a link", 0, false, steps({file("%H/v", "1234 x\n"), dir("%W"), special("%W/.rcp.lock", "%H/v")}),
+         lock, ELOOP},
         // A FIFO would block the open for ever, a device be read without end:
         // files the launcher reads must be regular files.
-        {"launcher properties are a FIFO", false, true,
-         [](Sandbox& sb, RunOptions&) {
-             unlink(sb.launcherProperties().c_str());
-             ASSERT_EQ(mkfifo(sb.launcherProperties().c_str(), 0644), 0);
-         },
-         "RLNCH0014E: Unable to load %P file!", EINVAL},
-        {"per-user installation properties are a FIFO", false, false,
-         [](Sandbox& sb, RunOptions&) {
-             makeDirs(sb.defaultConfig());
-             ASSERT_EQ(mkfifo((sb.defaultConfig() + "/rcpinstall.properties").c_str(), 0644), 0);
-         },
-         "RLNCH0014E: Unable to load %C/rcpinstall.properties file!", EINVAL},
-        {"base installation properties are a link to /dev/zero", false, false,
-         [](Sandbox& sb, RunOptions&) {
-             unlink((sb.base() + "/rcpinstall.properties").c_str());
-             ASSERT_EQ(symlink("/dev/zero", (sb.base() + "/rcpinstall.properties").c_str()), 0);
-         },
+        {"launcher properties are a FIFO", 0, true, special("%P", ""), load + "%P file!", EINVAL},
+        {"per-user installation properties are a FIFO", 0, false,
+         steps({dir("%C"), special("%C/rcpinstall.properties", "")}), load + "%C/rcpinstall.properties file!", EINVAL},
+        {"base installation properties are a link to /dev/zero", 0, false,
+         special("%S/inst/base/rcpinstall.properties", "/dev/zero"),
          "RLNCH0190E: Unable to open source file %S/inst/base/rcpinstall.properties to be copied", EINVAL},
-        {"update directory is a regular file", false, false,
-         [](Sandbox& sb, RunOptions&) { writeText(sb.defaultConfig() + "/org.eclipse.update", "x\n"); },
-         cannotCreate + "%C/org.eclipse.update directory.", EEXIST},
-        {"read-only launcher properties of a package-builder install", true, true,
-         [](Sandbox& sb, RunOptions&) {
-             sb.writeLauncherProperties("rcp.base.location=${rcp.home}/base\n"
-                                        "jvm.location=${rcp.home}/jre/bin/java\n"
-                                        "install.configuration=userpb\n");
-             ASSERT_EQ(chmod(sb.launcherProperties().c_str(), 0444), 0);
-         },
+        {"update directory is a file", 0, false, file("%C/org.eclipse.update"),
+         create + "%C/org.eclipse.update directory.", EEXIST},
+        {"read-only launcher properties of a package-builder install", 2, true,
+         file("%P", "rcp.base.location=${rcp.home}/base\njvm.location=/j\ninstall.configuration=userpb\n", 0444),
          "RLNCH0017E: Could not open %P to append rcp.install.id!", EACCES},
         // A reset moves the configuration area to "<area>bak" after removing
         // an older backup; when either cannot be done the area stays as it
-        // was. Removing a tree follows links (the data areas are not meant to
-        // hold any), so a dangling link cannot be examined and stays: root
-        // meets a backup it cannot remove. For a user, a workspace directory
-        // that is not writable refuses both the removal and the rename.
-        {"reset meets an old backup holding a dangling link", false, false,
-         [](Sandbox& sb, RunOptions& o) {
-             resetAfterFirstLaunch(sb, o, false);
-             makeDirs(sb.defaultConfig() + "bak");
-             ASSERT_EQ(symlink("/nonexistent/target", (sb.defaultConfig() + "bak/dangling").c_str()), 0);
-         },
+        // was. Removing a tree follows links, so a dangling link cannot be
+        // examined and stays: root meets a backup it cannot remove. For a
+        // user, a workspace directory that is not writable refuses both the
+        // removal and the rename.
+        {"reset meets a dangling link in the old backup", 0, false,
+         steps({reset, dir("%Cbak"), special("%Cbak/dangling", "/nonexistent/target")}),
          "RLNCH0084E end: Unable to remove all files in the old directory. Please correct the problems listed above",
-         kAnyErrno},
-        {"reset meets an old backup file the user may not delete", true, false,
-         [](Sandbox& sb, RunOptions& o) {
-             resetAfterFirstLaunch(sb, o, true);
-             writeText(sb.defaultConfig() + "bak", "old\n");
-         },
+         -1},
+        {"reset meets an old backup file the user may not delete", 2, false, steps({locked, file("%Cbak")}),
          "RLNCH0111E: Can't delete old copy of file '%Cbak'", EACCES},
-        {"reset in a workspace that does not let the user rename the area", true, false,
-         [](Sandbox& sb, RunOptions& o) { resetAfterFirstLaunch(sb, o, true); },
-         "RLNCH0112E: Can't move file/dir  '%C'", EACCES},
+        {"reset may not rename the area", 2, false, locked, "RLNCH0112E: Can't move file/dir  '%C'", EACCES},
+        // The fallback log: no line reaches a file through a link or a file
+        // another user made (who could read the queued arguments), and a
+        // FIFO does not make the launch hang. /tmp's owner may plant a link
+        // that the kernel follows for every user.
+        {"fallback log: the user's own link", 0, true, steps({fallback, special(kTmpLog, "%S/victim")}), "", 0},
+        {"fallback log: another user's link", 1, true,
+         steps({fallback, special(kTmpLog, "%S/victim"), own(kTmpLog, kNobody)}), "", 0},
+        {"fallback log: root's link, a user's launcher may write the target", 2, true,
+         steps({fallback, special(kTmpLog, "%S/victim"), own(kTmpLog, 0)}), "", 0},
+        {"fallback log: a FIFO", 0, true, steps({fallback, special(kTmpLog, "")}), "", 0},
+        {"fallback log: another user's file open to all", 1, true,
+         steps({fallback, file(kTmpLog, "another user's log\n", 0666), own(kTmpLog, kNobody)}), "", 0},
     };
-
-    for (const Fault& f : faults) {
-        SCOPED_TRACE(f.name);
-        if (f.asNobody && geteuid() != 0) {
-            std::cout << "skipped (needs root to run the launcher as nobody): " << f.name << "\n";
-            continue;
-        }
-        Sandbox sb;
-        sb.setupInstall("user");
-        RunOptions o;
-        if (f.asNobody) o.uid = o.gid = kNobody;
-        f.prepare(sb, o);
+    Sandbox sb;
+    for (const auto& [name, who, inTmpLog, prepare, text, err] : faults) {
+        SCOPED_TRACE(name);
+        if (who > 0 && notRoot(name)) continue;
+        sb.install("user");
+        sb.freshHome();
+        Launch o;
+        o.user = who == 2 ? kNobody : -1;
+        prepare(sb, o);
         if (::testing::Test::HasFatalFailure()) return;
-        const auto homeBefore = userFiles(sb.home());
-        const auto instBefore = userFiles(sb.inst());
-
-        LaunchResult r = sb.run(o);
-        EXPECT_EQ(r.status, 255) << r.describe();
-        EXPECT_FALSE(r.hasChild());
-        EXPECT_EQ(r.terminal, "");
-        EXPECT_EQ(r.tmpLogWritten, f.inTmpLog) << r.describe();
-        const std::string last = lastLine(f.inTmpLog ? r.tmpLog : r.log);
-        if (f.err == kAnyErrno) EXPECT_TRUE(isErrorLine(last, expand(f.message, sb))) << r.describe();
-        else EXPECT_EQ(last, errorLine(expand(f.message, sb), f.err)) << r.describe();
-        expectKept(homeBefore, sb.home());
-        expectKept(instBefore, sb.inst());
+        const std::string planted = entry(kTmpLog), line = expand(sb, text) + " : " + (err < 0 ? "" : strerror(err));
+        const Tree before = snapshot(sb.root), home = snapshot(sb.home);
+        Result r = sb.run(o);
+        EXPECT_TRUE(r.status == 255 && r.children.empty()) << r.status << r.describe();
+        EXPECT_EQ(r.tmpLog.empty(), !inTmpLog) << r.describe();
+        // The line ends with the system's text for the error (for err -1 whatever it is).
+        const std::string last = lastLine(inTmpLog ? r.tmpLog : r.log);
+        if (!planted.empty()) EXPECT_EQ(r.tmpLog, planted) << "the planted fallback log was replaced or written";
+        else EXPECT_EQ(err < 0 ? last.substr(0, line.size()) : last, line) << r.describe();
+        EXPECT_EQ(inTmpLog ? snapshot(sb.home) : home, home);
+        const Tree after = snapshot(sb.root);
+        for (const auto& [k, v] : before) EXPECT_EQ(after.count(k) ? after.at(k) : "(gone)", v) << k;
     }
 }
 
-// A small tmpfs at a directory of the sandbox, unmounted however the test
-// ends.
-class SmallDisk {
-public:
-    explicit SmallDisk(const std::string& dir) : dir_(dir) { makeDirs(dir); }
-    ~SmallDisk() { unmount(); }
-    bool mountWith(long bytes) {
-        unmount();
-        mounted_ = mount("tmpfs", dir_.c_str(), "tmpfs", 0, ("size=" + std::to_string(bytes)).c_str()) == 0;
-        return mounted_;
-    }
-    // Room for more, or (bytes = 0) exactly what is used now: full.
-    bool resize(long bytes) {
-        struct statvfs v;
-        if (bytes == 0 && statvfs(dir_.c_str(), &v) == 0) bytes = static_cast<long>((v.f_blocks - v.f_bfree) * v.f_frsize);
-        return mount("tmpfs", dir_.c_str(), "tmpfs", MS_REMOUNT, ("size=" + std::to_string(bytes)).c_str()) == 0;
-    }
-    void unmount() {
-        if (mounted_) umount2(dir_.c_str(), MNT_DETACH);
-        mounted_ = false;
-    }
-
-private:
-    std::string dir_;
-    bool mounted_ = false;
-};
-
-// The disk fills at any moment of a first launch: for every amount of free
-// space (in pages), the launch starts the platform or ends with its message,
-// every file it writes for the user is complete or absent (a missing
-// platform.xml is only reported with -debug; a missing per-user
-// rcpinstall.properties ends the launch), and once there is room again the
-// next launch writes exactly what a launch with room writes. A startup record
-// that changed but no longer fits leaves the previous one.
-TEST(Faults, FullDiskLeavesEveryFileCompleteOrAbsent) {
-    if (geteuid() != 0) GTEST_SKIP() << "needs root to mount a small tmpfs";
+// The preload library's path holds a blank, so the child reaches it through
+// the link /tmp/kel.rcp.<user>.<id>.<name>. The launcher makes and uses
+// that link only when the entry there is (or becomes) its own link to the
+// library: anything another user planted stays as it is and is not handed
+// to the child, nothing is written through a link, and the launch still
+// starts the platform.
+TEST(Faults, PreloadLinkIsOnlyEverOurOwn) {
+    // A user name of this test run, so that runs in parallel do not meet.
+    const std::string user = "rcptmp" + std::to_string(getpid()), link = "/tmp/kel.rcp." + user + ".ID42.libhook.so";
     Sandbox sb;
-    // Base files of several pages, so that a copy can be cut half-way.
-    sb.setupInstall("user", "", "# " + std::string(20000, 'p') + "\n");
+    const std::string lib = sb.path("lib dir/libhook.so"), victim = sb.path("victim.so");
+    sb.install("user", "", "library.preload=" + lib + "\n");
+    sb.write(lib, "not really a library\n");
+    // the entry planted, who (as in the fault table), whether the child gets the link
+    const std::tuple<const char*, int, Prepare, bool> cases[] = {
+        {"nothing there", 0, steps({}), true},
+        {"our own link to another library", 0, special(link, victim), true},
+        {"another user's link to another file", 1, steps({special(link, victim), own(link, kNobody)}), false},
+        {"another user's regular file", 1, steps({file(link, "planted\n", 0666), own(link, kNobody)}), false},
+        {"root's link to another file, launcher run by a user", 2,
+         steps({special(link, victim), own(link, 0), own("%H", kNobody)}), false},
+    };
+    for (const auto& [name, who, plant, used] : cases) {
+        SCOPED_TRACE(name);
+        if (who > 0 && notRoot(name)) continue;
+        sb.freshHome();
+        sb.write(victim, "someone else's file\n", 0666);
+        Launch o{{}, {{"USER", user}}};
+        o.user = who == 2 ? kNobody : -1;
+        plant(sb, o);
+        const std::string planted = entry(link);
+        Result r = sb.run(o);
+        const std::string after = entry(link);
+        unlink(link.c_str());
+        ASSERT_EQ(r.status, 0) << r.describe();
+        EXPECT_EQ(readText(victim), "someone else's file\n") << "written through the link";
+        EXPECT_EQ(r.child().env.count("LD_PRELOAD") ? r.child().env.at("LD_PRELOAD") : "", used ? link : "");
+        EXPECT_EQ(after, used ? "uid " + std::to_string(geteuid()) + " link -> " + lib : planted);
+    }
+}
+
+// A first launch cut short must leave nothing that makes the next launch
+// fail or lose a file. The base files span several pages, so that a copy
+// can be cut half-way.
+//
+// Killed at a random moment (SIGKILL: no handler, no exit path): the next
+// launch starts the platform as the main process, the user's own files are
+// all still there, and the configuration area holds exactly the files a
+// clean first launch writes. Every other round finds the user's data in the
+// workspace, the others a fresh home. The moments are spread over the time
+// a whole launch takes, measured here (so sanitizers and valgrind stretch
+// them alike); RCP_KILL_ROUNDS and RCP_KILL_SEED repeat a longer or a given
+// run.
+//
+// The disk full at any moment (the home a tmpfs of 1, 2, 3 ... pages): the
+// launch starts the platform or ends with its message, every file it writes
+// for the user is complete or absent (a missing platform.xml is only
+// reported with -debug; a missing per-user rcpinstall.properties ends the
+// launch), and once there is room again the next launch writes exactly what
+// a launch with room writes. A startup record that changed but no longer
+// fits leaves the previous one.
+TEST(Faults, InterruptedFirstLaunchesLeaveAUsableArea) {
+    Sandbox sb("user", "", "resetDir.a=org.x\n# " + std::string(20000, 'p') + "\n");
     std::string xml = "<config>\n";
     while (xml.size() < 40000) xml += "  <site url=\"platform:/base/" + std::to_string(xml.size()) + "\"/>\n";
-    sb.writeBase("platform.xml", xml + "</config>\n");
-    SmallDisk disk(sb.path("disk"));
-    const long room = 1 << 20, page = 4096;
-    if (!disk.mountWith(room)) GTEST_SKIP() << "cannot mount a tmpfs here: " << strerror(errno);
-    RunOptions o;
-    o.args = {"-data", sb.path("disk/ws")};
-    const std::string cfg = sb.path("disk/ws/.config"), log = sb.path("disk/ws/logs/rcplauncher.log");
-    ASSERT_EQ(sb.run(o).status, 0);
-    const auto reference = userFiles(cfg);
-    const auto referenceTree = listTree(cfg);
-    ASSERT_EQ(reference.size(), 4u);
-
-    std::set<std::string> endings;
-    for (long pages = 1;; pages++) {  // (a size of 0 means no limit)
-        SCOPED_TRACE(std::to_string(pages) + " pages free");
-        ASSERT_TRUE(disk.mountWith(pages * page));
-        LaunchResult r = sb.run(o);
-        EXPECT_EQ(r.terminal, "");
-        const std::string last = lastLine(r.tmpLogWritten ? r.tmpLog : readText(log));
-        if (r.status == 255) {
-            EXPECT_FALSE(r.hasChild());
-            endings.insert(last.substr(0, last.find(':')));
-        } else {
-            EXPECT_EQ(r.status, 0) << r.describe();
-        }
-        for (const auto& f : userFiles(cfg)) {
-            EXPECT_TRUE(reference.count(f.first)) << "left behind: " << f.first;
-            if (reference.count(f.first)) {
-                EXPECT_EQ(f.second.bytes, reference.at(f.first).bytes) << f.first;
-            }
-        }
-        const bool everything = r.status == 0 && userFiles(cfg).size() == reference.size();
-        ASSERT_TRUE(disk.resize(room));
-        ASSERT_EQ(sb.run(o).status, 0);
-        EXPECT_EQ(listTree(cfg), referenceTree);
-        for (const auto& f : userFiles(cfg)) EXPECT_EQ(f.second.bytes, reference.at(f.first).bytes) << f.first;
-        if (everything || ::testing::Test::HasFailure() || pages > 64) break;
-    }
-    // Among the endings: the per-user properties could not be completed.
-    EXPECT_TRUE(endings.count("RLNCH0014E")) << ::testing::PrintToString(endings);
-
-    const std::string record = readText(cfg + "/args.properties");
-    ASSERT_TRUE(disk.resize(0));
-    RunOptions changed = o;
-    changed.args.push_back("-changed");
-    LaunchResult r = sb.run(changed);
-    EXPECT_EQ(r.status, 255);
-    EXPECT_EQ(lastLine(readText(log)), errorLine("RLNCH0020E: Error writing to " + cfg + "/args.properties file.", ENOSPC));
-    EXPECT_EQ(readText(cfg + "/args.properties"), record);
-    EXPECT_EQ(listTree(cfg), referenceTree);
-}
-
-// Waits until every process this test started or adopted has ended: a child
-// that a killed launcher forked is reparented to the test (a subreaper) and
-// must be gone, or the next launch would rightly take it for a platform.
-void waitForNoChildren(int timeoutSeconds) {
-    auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(timeoutSeconds);
-    int status;
-    while (std::chrono::steady_clock::now() < deadline) {
-        pid_t r = waitpid(-1, &status, WNOHANG);
-        if (r < 0 && errno == ECHILD) return;
-        if (r == 0) std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    }
-    ADD_FAILURE() << "children left running";
-}
-
-int envNumber(const char* name, int fallback) {
-    const char* v = getenv(name);
-    return v && *v ? atoi(v) : fallback;
-}
-
-// A first launch killed at a random moment (SIGKILL: no handler, no exit
-// path) must leave nothing that makes the next launch fail or lose a file:
-// the next launch starts the platform as the main process, the user's own
-// files are all still there, and the per-user files are the ones a clean
-// first launch writes. Every other round runs in an existing workspace
-// holding user data ("-data"), the others in a fresh home. The moments are
-// spread over the time a whole launch takes, measured here (so sanitizers
-// and valgrind stretch them alike). RCP_KILL_ROUNDS and RCP_KILL_SEED
-// repeat a longer or a given run.
-TEST(Faults, LaunchesKilledAtRandomMomentsLeaveAUsableArea) {
-    Sandbox sb;
-    sb.setupInstall("user", "", "resetDir.a=org.x\n");
-    const int rounds = envNumber("RCP_KILL_ROUNDS", 10);
-    const unsigned seed = static_cast<unsigned>(envNumber("RCP_KILL_SEED", static_cast<int>(std::random_device()())));
+    sb.write(sb.base + "/platform.xml", xml + "</config>\n");
+    const char *rounds = getenv("RCP_KILL_ROUNDS"), *seedText = getenv("RCP_KILL_SEED");
+    const unsigned seed = seedText ? static_cast<unsigned>(atol(seedText)) : std::random_device()();
     std::mt19937 rng(seed);
     SCOPED_TRACE("RCP_KILL_SEED=" + std::to_string(seed));
-
-    // The reference: one clean first launch, timed.
-    RunOptions ref;
-    ref.env["HOME"] = sb.path("refhome");
-    sb.beginRuns();
-    auto t0 = std::chrono::steady_clock::now();
-    ASSERT_EQ(sb.waitFor(sb.start(ref)), 0);
-    const auto launchTime = std::chrono::duration_cast<std::chrono::microseconds>(std::chrono::steady_clock::now() - t0);
-    sb.releaseChildren(sb.collectChildren(1), false);
-    const std::string refConfig = sb.path("refhome/KEL/RCP/ID42/tester/.config");
-    const std::map<std::string, FileState> refFiles = userFiles(refConfig);
-    std::uniform_int_distribution<long> delay(0, static_cast<long>(launchTime.count()));
-
-    for (int round = 0; round < rounds; round++) {
-        const bool existingWorkspace = round % 2 == 1;
-        const std::string home = sb.path("home" + std::to_string(round));
-        const std::string data = sb.path("data" + std::to_string(round));
-        writeText(home + "/notes.txt", "the user's own file\n");
-        RunOptions o;
-        o.env["HOME"] = home;
-        if (existingWorkspace) {
-            writeText(data + "/project/a.txt", "project file\n");
-            writeText(data + "/.metadata/.plugins/org.x/state", "plug-in state\n");
-            o.args = {"-data", data};
-        }
-        const std::string ws = existingWorkspace ? data : home + "/KEL/RCP/ID42/tester";
-        const std::map<std::string, FileState> userBefore = userFiles(existingWorkspace ? data : home);
-
-        // A child the killed launcher may still have started records
-        // elsewhere, so that it is not taken for the next launch's child.
-        RunOptions killed = o;
-        killed.env["RCP_STUB_RECORD"] = sb.path("killed.record");
-        const long us = delay(rng);
-        SCOPED_TRACE("round " + std::to_string(round) + ", killed after " + std::to_string(us) + " us");
-        sb.beginRuns();
-        pid_t pid = sb.start(killed);
-        std::this_thread::sleep_for(std::chrono::microseconds(us));
-        kill(pid, SIGKILL);
-        const int killedStatus = sb.waitFor(pid);
-        EXPECT_TRUE(killedStatus == 128 + SIGKILL || killedStatus == 0) << killedStatus;
-        waitForNoChildren(15);
-
-        LaunchResult r = sb.run(o);
-        ASSERT_EQ(r.status, 0) << r.describe() << readText(ws + "/logs/rcplauncher.log");
-        ASSERT_TRUE(r.hasChild());
-        EXPECT_EQ(r.child().argIndex("-useDaemon"), -1);
-        EXPECT_EQ(r.terminal, "");
-        expectKept(userBefore, existingWorkspace ? data : home);
-        // The same files as after a clean launch, no work file left over.
-        EXPECT_EQ(listTree(ws + "/.config"), listTree(refConfig));
-        const std::map<std::string, FileState> files = userFiles(ws + "/.config");
-        ASSERT_EQ(files.size(), refFiles.size());
-        for (const auto& f : refFiles) {
-            if (f.first == "args.properties") continue;  // names the workspace
-            EXPECT_EQ(files.at(f.first).bytes, f.second.bytes) << f.first;
-        }
-        if (::testing::Test::HasFailure()) break;
+    const auto start = std::chrono::steady_clock::now();
+    ASSERT_EQ(sb.run().status, 0);
+    std::uniform_int_distribution<long> delay(
+        0, std::chrono::duration_cast<std::chrono::microseconds>(std::chrono::steady_clock::now() - start).count());
+    const Tree reference = snapshot(sb.cfg);
+    for (int round = 0; round < (rounds ? atoi(rounds) : 10) && !::testing::Test::HasFailure(); round++) {
+        sb.freshHome();
+        sb.write(sb.home + "/notes.txt", "the user's own file\n");
+        // Every other round a workspace that holds the user's data, without a configuration area yet.
+        for (const char* f : {"/project/a.txt", "/.metadata/.plugins/org.x/state"})
+            if (round % 2 == 1) sb.write(sb.ws + f, "the user's data\n");
+        const Tree before = snapshot(sb.home);
+        Launch killed;
+        killed.killAfterUs = delay(rng);
+        SCOPED_TRACE("round " + std::to_string(round) + ", killed after " + std::to_string(killed.killAfterUs) + " us");
+        const int status = sb.run(killed).status;
+        EXPECT_TRUE(status == 128 + SIGKILL || status == 0) << status;
+        Result r = sb.run();
+        ASSERT_EQ(r.children.size(), 1u) << r.describe();
+        EXPECT_EQ(r.child().index("-useDaemon"), -1);
+        const Tree after = snapshot(sb.home);
+        for (const auto& [k, v] : before) EXPECT_EQ(after.count(k) ? after.at(k) : "(gone)", v) << k;
+        EXPECT_EQ(snapshot(sb.cfg), reference);
     }
-}
 
-}  // namespace
+    if (notRoot("a small tmpfs")) return;
+    sb.freshHome();
+    // A fresh tmpfs of that size as the home, or (MS_REMOUNT) the mounted one resized; 0: to what it holds now.
+    auto mountHome = [&](long bytes, unsigned long flags) {
+        struct statvfs v;
+        if (bytes == 0 && statvfs(sb.home.c_str(), &v) == 0) bytes = (v.f_blocks - v.f_bfree) * v.f_frsize;
+        if (flags == 0) umount2(sb.home.c_str(), MNT_DETACH);
+        return mount("tmpfs", sb.home.c_str(), "tmpfs", flags, ("size=" + std::to_string(bytes)).c_str()) == 0;
+    };
+    const std::shared_ptr<void> unmount(nullptr, [&](void*) { umount2(sb.home.c_str(), MNT_DETACH); });
+    if (!mountHome(1 << 20, 0)) GTEST_SKIP() << "cannot mount a tmpfs here: " << strerror(errno);
+    std::string endings;
+    for (long pages = 1; pages <= 64; pages++) {  // (a size of 0 means no limit)
+        SCOPED_TRACE(std::to_string(pages) + " pages free");
+        ASSERT_TRUE(mountHome(pages * 4096, 0));
+        Result r = sb.run();
+        const std::string last = lastLine(r.tmpLog.empty() ? r.log : r.tmpLog);
+        EXPECT_TRUE(r.status == 0 || (r.status == 255 && r.children.empty())) << r.describe();
+        if (r.status != 0) endings += last.substr(0, last.find(':')) + " ";
+        const Tree files = snapshot(sb.cfg);
+        for (const auto& [k, v] : files) EXPECT_EQ(reference.count(k) ? reference.at(k) : "", v) << k;
+        ASSERT_TRUE(mountHome(1 << 20, MS_REMOUNT));
+        ASSERT_EQ(sb.run().status, 0);
+        EXPECT_EQ(snapshot(sb.cfg), reference);
+        if ((r.status == 0 && files == reference) || ::testing::Test::HasFailure()) break;
+    }
+    // Among the endings: the per-user properties could not be completed.
+    EXPECT_NE(endings.find("RLNCH0014E"), std::string::npos) << endings;
+    ASSERT_TRUE(mountHome(0, MS_REMOUNT));
+    Result r = sb.run({{"-changed"}});
+    EXPECT_EQ(r.status, 255);
+    EXPECT_EQ(lastLine(r.log),
+              "RLNCH0020E: Error writing to " + sb.cfg + "/args.properties file. : " + strerror(ENOSPC));
+    EXPECT_EQ(snapshot(sb.cfg), reference);
+}

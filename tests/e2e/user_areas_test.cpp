@@ -1,234 +1,204 @@
 // What a launch leaves in the user's areas: the files of a first launch,
 // their stability on later launches, resets, an area of another
-// installation, and the launch variants decided during startup (a "-vm"
-// override, an initial configuration run).
-#include <gtest/gtest.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
+// installation, and the launches decided during startup (an initial
+// configuration run, provisioning).
 #include "sandbox.h"
-#include "test_util.h"
 
 using namespace rcptest;
 
-namespace {
-
-const char* const kPlatformFiles[] = {"config.ini", "rcpinstall.properties", "org.eclipse.update/platform.xml"};
-
-// A first launch into an empty home creates exactly the user's areas and
-// files; a second launch leaves every per-user file alone even though the
+// The life of a workspace. A first launch into an empty home creates
+// exactly the user's areas and files. The base files begin with empty lines
+// and hold bytes in two encodings, and the first launch has no LANG (as when
+// the Finder starts it): the copies carry every byte unchanged.
+// "-resetconfig" on a first launch resets nothing and is not recorded. It
+// reaches the launcher through a link in an rcp directory of its own beside
+// a decoy, a later one through a linked installation: the installation is
+// the one where the executable really lies, and the startup record names the
+// resolved program.
+//
+// A later launch leaves every per-user file alone even though the
 // installation's copies changed in between, and rewrites its log and startup
-// record however long the earlier text was. The base files begin with empty
-// lines and hold bytes in two encodings, and the first launch has no LANG
-// (as when the Finder starts it): the copies carry every byte unchanged.
-TEST(UserAreas, FirstLaunchCreatesThePerUserFilesAndLaterLaunchesKeepThem) {
-    Sandbox sb;
-    sb.setupInstall("user", "com.kel.rcp.core.locale=fr_FR\n",
-                    "os.value.macosx=mac\n"
-                    "os.value.win32=win\\\n"
-                    "    continued\n"
-                    "os.value.linux=tux\n"
-                    "\n"
-                    "# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n");
-    const std::string configIni = Sandbox::standardConfigIni() + "# caf\xe9 \xc3\xb6\n";
-    sb.writeBase("rcpinstall.properties", "\n\n" + readText(sb.base() + "/rcpinstall.properties"));
-    sb.writeBase("platform.xml", "\n" + Sandbox::standardPlatformXml() + "<!-- caf\xe9 \xc3\xb6 -->\n");
-    sb.writeBase("config.ini", configIni);
-    // "-resetconfig" on a first launch resets nothing and is not recorded.
-    const std::string longArg = "/a/long/argument/" + std::string(3000, 'x');
-    RunOptions o;
-    o.args = {"-resetconfig", "-debug", "a b", longArg};
-    o.env["LANG"] = "";
-    LaunchResult first = sb.run(o);
-    ASSERT_EQ(first.status, 0) << first.describe();
-    ASSERT_TRUE(first.hasChild());
-    EXPECT_FALSE(first.tmpLogWritten);
-    EXPECT_EQ(first.terminal, "");
-
-    const std::string ws = "KEL/RCP/ID42/tester/";
-    const std::vector<std::string> expectedTree = {
-        "KEL/", "KEL/RCP/", "KEL/RCP/ID42/", ws,
-        ws + ".config/", ws + ".config/args.properties", ws + ".config/config.ini",
-        ws + ".config/org.eclipse.update/", ws + ".config/org.eclipse.update/platform.xml",
-        ws + ".config/rcpinstall.properties", ws + ".rcp.lock",
-        ws + "applications/", ws + "applications/eclipse/", ws + "applications/eclipse/features/",
-        ws + "applications/eclipse/plugins/", ws + "logs/", ws + "logs/rcplauncher.log"};
-    EXPECT_EQ(listTree(sb.home()), expectedTree);
-
-    const std::string cfg = sb.defaultConfig();
+// record however long the earlier text was (without "-debug" the log is just
+// the empty line that closes the empty queue); a "-resetconfig" that comes
+// from the launcher properties is no request to reset, and with "-console"
+// the launcher stays until its platform ends. Only one typed on the
+// command line resets: the configuration area goes to its backup, the
+// listed plug-in state directories go, and the files come back from the
+// installation's copies. A configuration area written by another
+// installation is set aside for a fresh one, keeping its platform.xml beside
+// it in the workspace. A launcher told to wait ("-rcpLauncherWait") stays
+// until its platform ends and exits 0 whatever the platform's status. A JVM
+// named with "-vm" brings the jvm.properties three levels above it, also
+// when named with backslashes.
+TEST(UserAreas, LifeOfAWorkspace) {
+    Sandbox sb("user", "com.kel.rcp.core.locale=fr_FR\nconfig.rs.1=-resetconfig\n",
+               "os.value.macosx=mac\nos.value.win32=win\\\n    continued\nos.value.linux=tux\nresetDir.a=org.x\n\n"
+               "# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n");
+    const std::string ws = sb.ws, cfg = sb.cfg, longArg = "/a/long/argument/" + std::string(3000, 'x');
+    sb.write(sb.base + "/rcpinstall.properties", "\n\n" + readText(sb.base + "/rcpinstall.properties"));
+    sb.write(sb.base + "/platform.xml",
+             "\n<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n  <site url=\"platform:/base/\" enabled=\"true\">"
+             "\n    <feature id=\"${jvm.feature.id}\" version=\"1.0\"/>\n  </site>\n</config>\n"
+             "<!-- caf\xe9 \xc3\xb6 -->\n");
+    sb.write(sb.base + "/config.ini", "osgi.bundles=x\n# caf\xe9 \xc3\xb6\n");
+    sb.write("links/rcp/rcplauncher.properties", "rcp.install.id=WRONG\n");
+    ASSERT_EQ(symlink(sb.launcher.c_str(), sb.path("links/rcp/rcplauncher").c_str()), 0);
+    ASSERT_EQ(symlink(sb.inst.c_str(), sb.path("links/inst").c_str()), 0);
+    Result r = sb.run({{"-resetconfig", "-debug", "a b", longArg}, {{"LANG", ""}}, sb.path("links/rcp/rcplauncher")});
+    ASSERT_EQ(r.status, 0) << r.describe();
+    EXPECT_EQ(r.tmpLog, "");
+    const std::string w = "KEL/RCP/ID42/tester/";
+    V tree = {"KEL/", "KEL/RCP/", "KEL/RCP/ID42/", w};
+    for (const char* p : {".config/", ".config/args.properties", ".config/config.ini", ".config/org.eclipse.update/",
+                          ".config/org.eclipse.update/platform.xml", ".config/rcpinstall.properties", ".rcp.lock",
+                          "applications/", "applications/eclipse/", "applications/eclipse/features/",
+                          "applications/eclipse/plugins/", "logs/", "logs/rcplauncher.log"})
+        tree.push_back(w + p);
+    EXPECT_EQ(names(snapshot(sb.home)), tree);
     EXPECT_EQ(readText(cfg + "/args.properties"),
-              "arg0=" + sb.launcher() + "\narg1=-debug\narg2=a b\narg3=" + longArg + "\nargc=4\n");
-    EXPECT_NE(first.log.find(longArg), std::string::npos) << "the debug log shows the child's arguments";
-    EXPECT_EQ(readText(cfg + "/config.ini"), configIni);
+              "arg0=" + sb.launcher + "\narg1=-debug\narg2=a b\narg3=" + longArg + "\nargc=4\n");
+    EXPECT_NE(r.log.find(longArg), std::string::npos) << "the debug log shows the child's arguments";
+    EXPECT_EQ(readText(cfg + "/config.ini"), "osgi.bundles=x\n# caf\xe9 \xc3\xb6\n");
     EXPECT_EQ(readText(cfg + "/org.eclipse.update/platform.xml"),
-              "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n"
-              "<site url=\"platform:/base/\" enabled=\"true\">\n<feature>\n</site>\n</config>\n"
-              "<!-- caf\xe9 \xc3\xb6 -->\n");
+              "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n<site url=\"platform:/base/\" enabled=\"true\">\n"
+              "<feature>\n</site>\n</config>\n<!-- caf\xe9 \xc3\xb6 -->\n");
     EXPECT_EQ(readText(cfg + "/rcpinstall.properties"),
-              Sandbox::standardInstallProperties() +
-                  "os.value=mac\n"
-                  "# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n"
-                  "rcp.install.id=ID42\n"
-                  "vm=${rcp.home}/jre/bin/java\n"
-                  "rcp.base.location=${rcp.home}/base\n"
-                  "install.configuration=user\n"
-                  "com.kel.rcp.core.locale=fr_FR\n");
-    EXPECT_EQ(readText(sb.defaultWorkspace() + "/.rcp.lock"),
-              std::to_string(first.child().pid) + std::string(10, ' '));
+              kInstallProps + "os.value=mac\nresetDir.a=org.x\n# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n"
+                              "rcp.install.id=ID42\nvm=${rcp.home}/jre/bin/java\nrcp.base.location=${rcp.home}/base\n"
+                              "install.configuration=user\ncom.kel.rcp.core.locale=fr_FR\n");
 
-    std::map<std::string, FileState> before;
-    for (const char* f : kPlatformFiles) before[f] = fileState(cfg + "/" + f);
-    sb.writeBase("config.ini", "changed=1\n");
-    sb.writeBase("platform.xml", "<changed/>\n");
-    sb.writeBase("rcpinstall.properties", "changed=1\n");
-    sb.writeLauncherProperties(Sandbox::standardLauncherProperties("user") + "com.kel.rcp.core.bidi=true\n");
+    sb.write(cfg + "/marker", "old area");
+    sb.write(ws + "/.metadata/.plugins/org.x/state", "x");
+    sb.write(ws + "/.metadata/.plugins/org.y/state", "y");
+    Tree before = snapshot(ws);
+    for (const char* f : {"/config.ini", "/platform.xml", "/rcpinstall.properties"}) sb.write(sb.base + f, "new=1\n");
+    sb.write(sb.props, launcherProps("user") + "config.rs.1=-resetconfig\ncom.kel.rcp.core.bidi=true\n");
+    r = sb.run({{"-config", "rs", "-console"}, {}, sb.path("links/inst/rcp/rcplauncher")});
+    EXPECT_TRUE(r.child().index("-Drcp.home=" + sb.inst) != -1 && r.child().reapedByLauncher) << r.describe();
+    before[".config/args.properties"] = "uid " + std::to_string(geteuid()) + " file\narg0=" + sb.launcher +
+                                        "\narg1=-config\narg2=rs\narg3=-console\nargc=4\n";
+    EXPECT_EQ(snapshot(ws), before);
+    EXPECT_EQ(r.log, "\n");
 
-    // The log and the startup record are rewritten and hold only the second
-    // launch's shorter text; without "-debug" the log is just the empty line
-    // that closes the (empty) queue.
-    LaunchResult second = sb.run({"-x"});
-    ASSERT_EQ(second.status, 0) << second.describe();
-    EXPECT_EQ(listTree(sb.home()), expectedTree);
-    for (const char* f : kPlatformFiles) EXPECT_TRUE(fileState(cfg + "/" + f) == before[f]) << f;
-    EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher() + "\narg1=-x\nargc=2\n");
-    EXPECT_EQ(second.log, "\n");
-    EXPECT_EQ(second.terminal, "");
-}
-
-// Only "-resetconfig" typed on the command line of a later launch resets:
-// the configuration area goes to its backup, the listed plug-in state
-// directories go, and the files come back from the installation's copies.
-TEST(UserAreas, ResetComesOnlyFromTheTypedCommandLine) {
-    Sandbox sb;
-    sb.setupInstall("user", "config.rs.1=-resetconfig\n", "resetDir.a=org.x\n");
-    const std::string ws = sb.defaultWorkspace();
-    const std::string cfg = sb.defaultConfig();
-
-    LaunchResult first = sb.run({"-resetconfig"});
-    ASSERT_EQ(first.status, 0) << first.describe();
-    EXPECT_FALSE(pathExists(ws + "/.configbak"));
-    writeText(cfg + "/marker", "old area");
-    writeText(ws + "/.metadata/.plugins/org.x/state", "x");
-    writeText(ws + "/.metadata/.plugins/org.y/state", "y");
-
-    // "-resetconfig" coming from the launcher properties is not a request.
-    LaunchResult fromProps = sb.run({"-config", "rs"});
-    ASSERT_EQ(fromProps.status, 0) << fromProps.describe();
-    EXPECT_FALSE(pathExists(ws + "/.configbak"));
-    EXPECT_TRUE(pathExists(cfg + "/marker"));
-    EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.x/state"));
-
-    sb.writeBase("config.ini", "fresh=1\n");
-    LaunchResult reset = sb.run({"-resetconfig"});
-    ASSERT_EQ(reset.status, 0) << reset.describe();
-    ASSERT_TRUE(reset.hasChild());
+    sb.write(sb.base + "/config.ini", "fresh=1\n");
+    r = sb.run({{"-resetconfig", "-rcpLauncherWait"}, {{"RCP_STUB_SLEEP", "1"}, {"RCP_STUB_EXIT", "7"}}});
+    EXPECT_TRUE(r.status == 0 && r.child().reapedByLauncher && r.child().index("-resetconfig") == -1) << r.describe();
     EXPECT_EQ(readText(ws + "/.configbak/marker"), "old area");
-    EXPECT_FALSE(pathExists(cfg + "/marker"));
+    EXPECT_EQ(names(snapshot(cfg)), (V{"args.properties", "config.ini", "org.eclipse.update/",
+                                       "org.eclipse.update/platform.xml", "rcpinstall.properties"}));
     EXPECT_EQ(readText(cfg + "/config.ini"), "fresh=1\n");
-    EXPECT_TRUE(pathExists(cfg + "/rcpinstall.properties"));
-    EXPECT_TRUE(pathExists(cfg + "/org.eclipse.update/platform.xml"));
-    EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher() + "\nargc=1\n");
+    EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher + "\narg1=-rcpLauncherWait\nargc=2\n");
     EXPECT_FALSE(pathExists(ws + "/.metadata/.plugins/org.x"));
     EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.y/state"));
-    EXPECT_EQ(reset.child().argIndex("-resetconfig"), -1);
-}
 
-// A configuration area written by another installation is set aside for a
-// fresh one, keeping its platform.xml beside it in the workspace.
-TEST(UserAreas, AreaOfAnotherInstallationIsSetAside) {
-    Sandbox sb;
-    const std::string data = sb.path("data");
-    sb.setupInstall("user", "rcp.data=" + data + "/\n");
-    LaunchResult first = sb.run();
-    ASSERT_EQ(first.status, 0) << first.describe();
-    const std::string oldPlatformXml = readText(data + "/.config/org.eclipse.update/platform.xml");
-    ASSERT_FALSE(oldPlatformXml.empty());
-
-    sb.writeLauncherProperties("rcp.install.id=ID43\nrcp.base.location=${rcp.home}/base\n"
-                               "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=user\n"
-                               "rcp.data=" + data + "/\n");
-    LaunchResult r = sb.run();
-    ASSERT_EQ(r.status, 0) << r.describe();
-    EXPECT_EQ(r.workspace, data);
-    EXPECT_EQ(readText(data + "/platform.xml.old"), oldPlatformXml);
-    EXPECT_NE(readText(data + "/.configbak/rcpinstall.properties").find("rcp.install.id=ID42\n"), std::string::npos);
-    EXPECT_NE(readText(data + "/.config/rcpinstall.properties").find("rcp.install.id=ID43\n"), std::string::npos);
-    EXPECT_NE(r.child().argIndex("-Dcom.kel.rcp.install.id=ID43"), -1);
-}
-
-// A JVM named with "-vm" brings the jvm.properties three levels above it; a
-// path too shallow for that stops the startup before the command line is
-// built, so no child runs, though the user's files are in place.
-TEST(UserAreas, VmOverrideAndItsJvmProperties) {
-    struct Case {
-        std::string vm;        // "@" stands for the sandbox root; "" = "-vm" without a value
-        bool child;
-        std::string jvmProps;  // where -Dfrom.jvm.props=1 is written, relative to the sandbox root
-    };
-    const std::vector<Case> cases = {
-        {"java", false, ""},           {"bin/java", false, ""},
-        {"/jre/bin/java", true, ""},   {"@/j/jre/bin/java", true, "j/jvm.properties"},
-        {"k\\jre\\bin\\java", true, "k/jvm.properties"}, {"", true, ""},
-    };
-    for (const auto& c : cases) {
-        Sandbox sb;
-        std::string vm = !c.vm.empty() && c.vm[0] == '@' ? sb.root() + c.vm.substr(1) : c.vm;
-        SCOPED_TRACE(vm);
-        sb.setupInstall("user");
-        if (!c.jvmProps.empty()) sb.writeFile(c.jvmProps, "-Dfrom.jvm.props=1\n");
-        RunOptions o;
-        o.args = {"-vm"};
-        if (!vm.empty()) o.args.push_back(vm);
-        o.expectChildren = c.child ? 1 : 0;
-        LaunchResult r = sb.run(o);
-        EXPECT_EQ(r.status, 0) << r.describe();
-        EXPECT_EQ(r.hasChild(), c.child);
-        EXPECT_TRUE(pathExists(sb.defaultConfig() + "/rcpinstall.properties"));
-        EXPECT_EQ(pathExists(sb.defaultConfig() + "/org.eclipse.update"), c.child);
-        if (!c.child) continue;
-        EXPECT_EQ(r.child().argAfter("-vm"), vm.empty() ? sb.jvm() : vm);
-        EXPECT_EQ(r.child().argIndex("-Dfrom.jvm.props=1") != -1, !c.jvmProps.empty());
-    }
+    const std::string platformXml = readText(cfg + "/org.eclipse.update/platform.xml");
+    sb.write(sb.props, "rcp.install.id=ID43\nrcp.base.location=${rcp.home}/base\n"
+                       "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=user\nrcp.data=" + ws + "/\n");
+    sb.write("k/jvm.properties", "-Dk=1\n");
+    r = sb.run({{"-vm", "k\\jre\\bin\\java"}});
+    EXPECT_EQ(r.child().after("-data") + " " + r.child().after("-vm"), ws + " k\\jre\\bin\\java");
+    EXPECT_TRUE(r.child().index("-Dcom.kel.rcp.install.id=ID43") != -1 && r.child().index("-Dk=1") != -1);
+    EXPECT_EQ(readText(ws + "/platform.xml.old"), platformXml);
+    EXPECT_NE(readText(ws + "/.configbak/rcpinstall.properties").find("rcp.install.id=ID42\n"), std::string::npos);
+    EXPECT_NE(readText(cfg + "/rcpinstall.properties").find("rcp.install.id=ID43\n"), std::string::npos);
 }
 
 // A platform that has not finished its initial configuration is started
-// with the "config.initial" arguments and the user's "-data" only.
+// with the "config.initial" arguments and the user's "-data" only: neither
+// the typed options nor the typed VM arguments.
 TEST(UserAreas, InitialConfigurationLaunch) {
-    struct Case {
-        const char* name;
-        std::string configuration;
-        std::string installExtra;
-        bool withData;
-        bool initial;
-    };
-    const std::vector<Case> cases = {
-        {"not yet configured", "user", "", true, true},
-        {"not yet configured, default workspace", "user", "", false, true},
-        {"configured", "user", "rcp.initial.done=true\n", true, false},
-        {"lockdown never", "lockdown", "", true, false},
-    };
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.name);
-        Sandbox sb;
-        sb.setupInstall(c.configuration,
-                        "config.initial.1=-initialCompleteFlag\nconfig.initial.2=rcp.initial.done\n",
-                        c.installExtra);
-        const std::string data = sb.path("ws");
-        std::vector<std::string> args = {"-foo"};
-        if (c.withData) args.insert(args.end(), {"-data", data});
-        args.insert(args.end(), {"-vmargs", "-Dx=1"});
-        LaunchResult r = sb.run(args);
-        ASSERT_EQ(r.status, 0) << r.describe();
-        const auto& argv = r.child().argv;
-        ASSERT_GT(argv.size(), 4u);
-        EXPECT_EQ(r.workspace, c.withData ? data : sb.defaultWorkspace());
-        using V = std::vector<std::string>;
-        const V expected = c.initial ? V{"-initialCompleteFlag", "rcp.initial.done", "-data"} : V{"-foo", "-data", data};
-        EXPECT_EQ(V(argv.begin() + 1, argv.begin() + 4), expected);
-        // Neither the typed options nor the typed VM arguments on an initial launch.
-        EXPECT_EQ(r.child().argIndex("-foo") == -1, c.initial);
-        EXPECT_EQ(r.child().argIndex("-Dx=1") == -1, c.initial);
+    // configuration, installation properties, "-data" typed, an initial launch
+    const std::tuple<const char*, const char*, bool, bool> cases[] = {
+        {"user", "", true, true}, {"user", "", false, true}, {"user", "rcp.initial.done=true\n", true, false},
+        {"lockdown", "", true, false}};
+    Sandbox sb;
+    for (const auto& [configuration, installExtra, withData, initial] : cases) {
+        SCOPED_TRACE(std::string(configuration) + " " + installExtra + (withData ? " -data" : ""));
+        sb.install(configuration, "config.initial.1=-initialCompleteFlag\nconfig.initial.2=rcp.initial.done\n",
+                   installExtra);
+        sb.freshHome();
+        const std::string data = withData ? sb.home + "/ws" : sb.ws;
+        Result r = sb.run({withData ? V{"-foo", "-data", data, "-vmargs", "-Dx=1"} : V{"-foo", "-vmargs", "-Dx=1"}});
+        const V& argv = r.child().argv;
+        ASSERT_GT(argv.size(), 4u) << r.describe();
+        const V expected = initial ? V{"-initialCompleteFlag", "rcp.initial.done", "-data", data}
+                                   : V{"-foo", "-data", data, "-configuration"};
+        EXPECT_EQ(V(argv.begin() + 1, argv.begin() + 5), expected);
+        EXPECT_EQ(r.child().index("-foo") == -1, initial);
+        EXPECT_EQ(r.child().index("-Dx=1") == -1, initial);
     }
 }
 
-}  // namespace
+// Provisioning: a user's first launch, a new manifest level and the
+// installer's request each run the provisioning child in its own
+// command-line order, wait for it and exit without starting the platform; an
+// unchanged level (or none shipped) starts the platform as usual, and so
+// does a launcher that finds a platform running. A multi-user installation
+// provisioned by the superuser gets the service's own area in the
+// installation.
+TEST(UserAreas, ProvisioningSequence) {
+    for (const std::string configuration : {"user", "multiuser", "lockdown"}) {
+        SCOPED_TRACE(configuration);
+        Sandbox sb;
+        const std::string shared = sb.path("shared"), userProps = sb.cfg + "/rcpinstall.properties";
+        sb.install(configuration, "provisioning=true\nprovisioning.manifest.version=2\n",
+                   "provisioning.application=com.kel.provision\njvm.shareclasses.fullpath=" + shared + "\n");
+        const bool serviceArea = geteuid() == 0 && configuration != "user";
+        // The provisioning child's command line: the platform options, the
+        // provisioning application (and "-userProvLaunch" unless the
+        // installer asked), the JVM, the start-up jar and the JVM's own
+        // arguments. No "-useDaemon" and no "-XstartOnFirstThread": the
+        // launcher ends inside its startup sequence.
+        auto provisioning = [&](V args, bool userLaunch, const std::string& area) {
+            args.insert(args.begin(), sb.eclipse);
+            for (const std::string& a :
+                 V{"-data", sb.ws, "-configuration", sb.cfg, "-application", "com.kel.demo.app", "-application",
+                   "com.kel.provision", "-userProvLaunch", "-vm", sb.jvm, "-startup", sb.base + "/launcher.jar",
+                   "-vmargs", "-Dvmarg.one=1", "-Drcp.home=" + sb.inst, "-Drcp.data=" + sb.ws,
+                   "-Dcom.kel.rcp.install.id=ID42", "-Drcp.install.config=" + configuration, "-Dbase.prop=one",
+                   "-Drcp.osgi.install.area=" + sb.inst + area, "-Xmx256m", "-cp", sb.inst + "/lib/boot.jar"})
+                if (userLaunch || a != "-userProvLaunch") args.push_back(a);
+            return args;
+        };
+        auto platform = [](const Result& r) { return r.child().index("-XstartOnFirstThread") > 0; };
+
+        // A user's first launch provisions; the level recorded by nobody yet
+        // is new, so the shared classes go too.
+        sb.write(shared + "/cache.bin", "x");
+        Result r = sb.run({{"-foo", "-debug"}, {{"RCP_STUB_SLEEP", "1"}}});
+        EXPECT_TRUE(r.child().reapedByLauncher) << r.describe();
+        EXPECT_EQ(r.child().argv, provisioning({"-foo", "-debug"}, true, "/rcp/eclipse"));
+        EXPECT_TRUE(isDir(shared) && !pathExists(shared + "/cache.bin"));
+        EXPECT_EQ(pathExists(sb.inst + "/eclipse/.muservice/.config/org.eclipse.update/platform.xml"), serviceArea);
+        EXPECT_NE(r.log.find("RLNCH0129I: ===== Begin Provisioning Parameters ====="), std::string::npos);
+
+        // The provisioned level recorded in the user's properties, and the
+        // installation ships no level or the same one: nothing new, so the
+        // platform itself starts, and the shared classes stay.
+        sb.write(userProps, readText(userProps) + "provisioning.manifest.version=2\n");
+        sb.write(shared + "/cache.bin", "x");
+        for (const std::string shipped : {"", "provisioning.manifest.version=2\n"}) {
+            sb.write(sb.props, launcherProps(configuration) + "provisioning=true\n" + shipped);
+            EXPECT_TRUE(platform(sb.run({{"-foo"}}))) << shipped;
+        }
+        // The installer asks: provisioning at the same level, without
+        // "-userProvLaunch", its options passed on to the platform.
+        const V installer = {"-rcpLauncherWait", "-provManifest", "m.xml"};
+        r = sb.run({installer});
+        EXPECT_EQ(r.child().argv, provisioning(installer, false, serviceArea ? "/eclipse" : "/rcp/eclipse"));
+        EXPECT_TRUE(pathExists(shared + "/cache.bin"));
+
+        // Only the main launcher provisions: one that finds a platform
+        // running (this test process stands for it) starts a normal child
+        // handed to it, even at a new level, and leaves the startup record
+        // alone. The hand-over follows the JVM: "-vm <jvm> -useDaemon <pid>".
+        sb.write(sb.props, launcherProps(configuration) + "provisioning=true\nprovisioning.manifest.version=4\n");
+        sb.write(sb.ws + "/.rcp.lock", std::to_string(getpid()));
+        const std::string record = readText(sb.cfg + "/args.properties");
+        r = sb.run();
+        EXPECT_TRUE(platform(r)) << r.describe();
+        EXPECT_EQ(r.child().after(sb.jvm), "-useDaemon");
+        EXPECT_EQ(r.child().after("-useDaemon"), std::to_string(getpid()));
+        EXPECT_EQ(readText(sb.cfg + "/args.properties"), record);
+    }
+}
