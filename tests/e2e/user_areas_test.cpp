@@ -32,7 +32,7 @@ using namespace rcptest;
 // when named with backslashes.
 TEST(UserAreas, LifeOfAWorkspace) {
     Sandbox sb("user", "com.kel.rcp.core.locale=fr_FR\nconfig.rs.1=-resetconfig\n",
-               "os.value.macosx=mac\nos.value.win32=win\\\n    continued\nos.value.linux=tux\nresetDir.a=org.x\n\n"
+               "os.value.macosx=mac\nos.value.win32=win\\\n    continued\nos.value.linux=tux\nresetDir.a=org.x\nresetDir.b=../../../outside\n\n"
                "# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n");
     const std::string ws = sb.ws, cfg = sb.cfg, longArg = "/a/long/argument/" + std::string(3000, 'x');
     sb.write(sb.base + "/rcpinstall.properties", "\n\n" + readText(sb.base + "/rcpinstall.properties"));
@@ -63,13 +63,14 @@ TEST(UserAreas, LifeOfAWorkspace) {
               "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n<site url=\"platform:/base/\" enabled=\"true\">\n"
               "<feature>\n</site>\n</config>\n<!-- caf\xe9 \xc3\xb6 -->\n");
     EXPECT_EQ(readText(cfg + "/rcpinstall.properties"),
-              kInstallProps + "os.value=mac\nresetDir.a=org.x\n# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n"
+              kInstallProps + "os.value=mac\nresetDir.a=org.x\nresetDir.b=../../../outside\n# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n"
                               "rcp.install.id=ID42\nvm=${rcp.home}/jre/bin/java\nrcp.base.location=${rcp.home}/base\n"
                               "install.configuration=user\ncom.kel.rcp.core.locale=fr_FR\n");
 
     sb.write(cfg + "/marker", "old area");
     sb.write(ws + "/.metadata/.plugins/org.x/state", "x");
     sb.write(ws + "/.metadata/.plugins/org.y/state", "y");
+    sb.write(ws + "/../outside/state", "beside the workspace");  // a resetDir value with ".." is ignored
     Tree before = snapshot(ws);
     for (const char* f : {"/config.ini", "/platform.xml", "/rcpinstall.properties"}) sb.write(sb.base + f, "new=1\n");
     sb.write(sb.props, launcherProps("user") + "config.rs.1=-resetconfig\ncom.kel.rcp.core.bidi=true\n");
@@ -89,7 +90,7 @@ TEST(UserAreas, LifeOfAWorkspace) {
     EXPECT_EQ(readText(cfg + "/config.ini"), "fresh=1\n");
     EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher + "\narg1=-rcpLauncherWait\nargc=2\n");
     EXPECT_FALSE(pathExists(ws + "/.metadata/.plugins/org.x"));
-    EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.y/state"));
+    EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.y/state") && pathExists(ws + "/../outside/state"));
 
     const std::string platformXml = readText(cfg + "/org.eclipse.update/platform.xml");
     sb.write(sb.props, "rcp.install.id=ID43\nrcp.base.location=${rcp.home}/base\n"
@@ -163,12 +164,18 @@ TEST(UserAreas, ProvisioningSequence) {
         auto platform = [](const Result& r) { return r.child().index("-XstartOnFirstThread") > 0; };
 
         // A user's first launch provisions; the level recorded by nobody yet
-        // is new, so the shared classes go too.
+        // is new, so the shared classes go too. What cannot be removed (a
+        // dangling link) is listed in one error block, and the launch goes on.
         sb.write(shared + "/cache.bin", "x");
+        ASSERT_EQ(symlink("/nonexistent", (shared + "/dangling").c_str()), 0);
         Result r = sb.run({{"-foo", "-debug"}, {{"RCP_STUB_SLEEP", "1"}}});
         EXPECT_TRUE(r.child().reapedByLauncher) << r.describe();
         EXPECT_EQ(r.child().argv, provisioning({"-foo", "-debug"}, true, "/rcp/eclipse"));
         EXPECT_TRUE(isDir(shared) && !pathExists(shared + "/cache.bin"));
+        EXPECT_NE(r.log.find("\nRLNCH0086E begin: Error removing shared classes directory\nCan't stat " + shared +
+                             "/dangling  -  Failed with error 2: " + strerror(ENOENT) +
+                             "\n\nRLNCH0087E end: Unable to remove all files in the shared classes directory. "),
+                  std::string::npos) << r.log;
         EXPECT_EQ(pathExists(sb.inst + "/eclipse/.muservice/.config/org.eclipse.update/platform.xml"), serviceArea);
         EXPECT_NE(r.log.find("RLNCH0129I: ===== Begin Provisioning Parameters ====="), std::string::npos);
 
