@@ -82,13 +82,14 @@ TEST(UserAreas, LifeOfAWorkspace) {
     EXPECT_EQ(r.log, "\n");
 
     sb.write(sb.base + "/config.ini", "fresh=1\n");
-    r = sb.run({{"-resetconfig", "-rcpLauncherWait"}, {{"RCP_STUB_SLEEP", "1"}, {"RCP_STUB_EXIT", "7"}}});
+    r = sb.run({{"-resetconfig", "-rcpLauncherWait", "-vm"}, {{"RCP_STUB_SLEEP", "1"}, {"RCP_STUB_EXIT", "7"}}});
     EXPECT_TRUE(r.status == 0 && r.child().reapedByLauncher && r.child().index("-resetconfig") == -1) << r.describe();
+    EXPECT_EQ(r.child().after("-vm"), sb.jvm);  // "-vm" without a value is no override
     EXPECT_EQ(readText(ws + "/.configbak/marker"), "old area");
     EXPECT_EQ(names(snapshot(cfg)), (V{"args.properties", "config.ini", "org.eclipse.update/",
                                        "org.eclipse.update/platform.xml", "rcpinstall.properties"}));
     EXPECT_EQ(readText(cfg + "/config.ini"), "fresh=1\n");
-    EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher + "\narg1=-rcpLauncherWait\nargc=2\n");
+    EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher + "\narg1=-rcpLauncherWait\narg2=-vm\nargc=3\n");
     EXPECT_FALSE(pathExists(ws + "/.metadata/.plugins/org.x"));
     EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.y/state") && pathExists(ws + "/../outside/state"));
 
