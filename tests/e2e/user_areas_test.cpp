@@ -31,7 +31,7 @@ using namespace rcptest;
 // named with "-vm" brings the jvm.properties three levels above it, also
 // when named with backslashes.
 TEST(UserAreas, LifeOfAWorkspace) {
-    Sandbox sb("user", "com.kel.rcp.core.locale=fr_FR\nconfig.rs.1=-resetconfig\n",
+    Sandbox sb("user", "com.kel.rcp.core.locale=fr_FR\ncom.kel.rcp.core.bidi=true\nconfig.rs.1=-resetconfig\n",
                "os.value.macosx=mac\nos.value.win32=win\\\n    continued\nos.value.linux=tux\nresetDir.a=org.x\nresetDir.b=../../../outside\n\n"
                "# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n");
     const std::string ws = sb.ws, cfg = sb.cfg, longArg = "/a/long/argument/" + std::string(3000, 'x');
@@ -65,7 +65,7 @@ TEST(UserAreas, LifeOfAWorkspace) {
     EXPECT_EQ(readText(cfg + "/rcpinstall.properties"),
               kInstallProps + "os.value=mac\nresetDir.a=org.x\nresetDir.b=../../../outside\n# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n"
                               "rcp.install.id=ID42\nvm=${rcp.home}/jre/bin/java\nrcp.base.location=${rcp.home}/base\n"
-                              "install.configuration=user\ncom.kel.rcp.core.locale=fr_FR\n");
+                              "install.configuration=user\ncom.kel.rcp.core.locale=fr_FR\ncom.kel.rcp.core.bidi=true\n");
 
     sb.write(cfg + "/marker", "old area");
     sb.write(ws + "/.metadata/.plugins/org.x/state", "x");
