@@ -162,7 +162,7 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
         // user, a workspace directory that is not writable refuses both the
         // removal and the rename.
         {"reset meets a dangling link in the old backup", 0, false,
-         steps({reset, dir("%Cbak"), special("%Cbak/dangling", "/nonexistent/target")}),
+         steps({reset, dir("%Cbak"), special("%Cbak/dangling", "%S/no-such-target")}),
          "RLNCH0084E end: Unable to remove all files in the old directory. Please correct the problems listed above",
          -1},
         {"reset meets an old backup file the user may not delete", 2, false, steps({locked, file("%Cbak")}),

@@ -168,7 +168,7 @@ TEST(UserAreas, ProvisioningSequence) {
         // is new, so the shared classes go too. What cannot be removed (a
         // dangling link) is listed in one error block, and the launch goes on.
         sb.write(shared + "/cache.bin", "x");
-        ASSERT_EQ(symlink("/nonexistent", (shared + "/dangling").c_str()), 0);
+        ASSERT_EQ(symlink(sb.path("no-such-target").c_str(), (shared + "/dangling").c_str()), 0);
         Result r = sb.run({{"-foo", "-debug"}, {{"RCP_STUB_SLEEP", "1"}}});
         EXPECT_TRUE(r.child().reapedByLauncher) << r.describe();
         EXPECT_EQ(r.child().argv, provisioning({"-foo", "-debug"}, true, "/rcp/eclipse"));
