@@ -57,7 +57,11 @@ export RCP_LAUNCHER_BINARY="$launcher"
 # --child-silent-after-fork: the launcher's forked child runs under valgrind
 # only until its execv; a child whose execv fails ends at once with _exit and
 # is no launcher run of its own.
-export RCP_LAUNCHER_WRAPPER="$valgrind --tool=memcheck --child-silent-after-fork=yes --quiet --error-exitcode=99 --leak-check=full \
+# --vgdb=no: otherwise every run makes FIFOs and a file named after its pid
+# in /tmp, which a killed run leaves behind; a later run as another user
+# that gets the same pid cannot make its own and valgrind ends with status 1
+# before the launcher starts.
+export RCP_LAUNCHER_WRAPPER="$valgrind --tool=memcheck --vgdb=no --child-silent-after-fork=yes --quiet --error-exitcode=99 --leak-check=full \
 --errors-for-leak-kinds=definite --show-leak-kinds=definite --track-origins=yes \
 --suppressions=$root/scripts/valgrind.supp --log-file=$logs/launcher.%p.log"
 
