@@ -114,12 +114,6 @@ Result Sandbox::runMany(const std::vector<Launch>& launches) {
                   "RCP_STUB_RECORD=" + recordDir};
         for (const std::string name : {"ASAN_OPTIONS", "UBSAN_OPTIONS", "LSAN_OPTIONS"})
             if (getenv(name.c_str())) args.push_back(name + "=" + getenv(name.c_str()));
-        // A launcher killed during the leak check at its exit leaves the
-        // checker's complaint on the terminal; the launches that end are
-        // the ones checked for leaks.
-        if (l.killAfterUs >= 0)
-            args.push_back("ASAN_OPTIONS=" + std::string(getenv("ASAN_OPTIONS") ? getenv("ASAN_OPTIONS") : "") +
-                           ":detect_leaks=0");
         for (const auto& kv : l.env) args.push_back(kv.first + "=" + kv.second);
         std::istringstream wrapper(getenv("RCP_LAUNCHER_WRAPPER") ? getenv("RCP_LAUNCHER_WRAPPER") : "");
         args.insert(args.end(), std::istream_iterator<std::string>(wrapper), {});
@@ -167,10 +161,11 @@ Result Sandbox::runMany(const std::vector<Launch>& launches) {
     if (!poll(15, [] { return waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD; }))
         ADD_FAILURE() << "children left running";
     // The child's loader may complain about a preload library that cannot
-    // be loaded, and LeakSanitizer's helper, which stops the launcher at its
-    // exit for the leak check, now and then reports that it could not read
-    // a stopped thread's registers (it then counts the whole stack as
-    // reachable); the launcher itself writes nothing to the terminal.
+    // be loaded, and LeakSanitizer's helper, which stops a program at its
+    // exit for the leak check, reports that it could not read a stopped
+    // thread's registers when that program is killed meanwhile (a launcher
+    // or child killed here) and now and then without a kill; the launcher
+    // itself writes nothing to the terminal.
     std::istringstream out(readText(terminal));
     for (std::string line; std::getline(out, line);)
         if (line.find("from LD_PRELOAD cannot be preloaded") == std::string::npos &&
