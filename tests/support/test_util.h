@@ -33,16 +33,14 @@ inline void makeDirs(const std::string& path) {
     mkdir(path.c_str(), 0755);
 }
 
-// A file, or a directory with everything below it, read-only ones included.
+// A file, or a directory with everything below it: read-only directories are
+// opened up first, and remove_all also reaches paths longer than PATH_MAX.
 inline void removeTree(const std::string& path) {
-    if (!isDir(path)) {
-        unlink(path.c_str());
-        return;
-    }
-    chmod(path.c_str(), 0700);
     std::error_code ec;
-    for (const auto& entry : std::filesystem::directory_iterator(path, ec)) removeTree(entry.path());
-    rmdir(path.c_str());
+    if (isDir(path) && chmod(path.c_str(), 0700) == 0)
+        for (std::filesystem::recursive_directory_iterator it(path, ec), end; it != end; it.increment(ec))
+            if (isDir(it->path())) chmod(it->path().c_str(), 0700);
+    std::filesystem::remove_all(path, ec);
 }
 
 // Writes text to path (creating parent directories), mode 0644 unless given.
