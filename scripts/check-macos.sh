@@ -157,7 +157,7 @@ settle() {
 compile() {
   local dir=$1 cmd=() src name logs=()
   shift
-  while [ "$1" != -- ]; do cmd+=("$1"); shift; done
+  while [ $# -gt 0 ] && [ "$1" != -- ]; do cmd+=("$1"); shift; done
   shift
   mkdir -p "$dir"
   objs=()

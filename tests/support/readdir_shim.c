@@ -31,14 +31,11 @@ struct dirent* readdir(DIR* dir) {
     return entry;
 }
 
-int unlink(const char* path) {
-    const int result = NEXT("unlink", int (*)(const char*))(path);
+// A removal counts while a listing is open.
+static int removal(int result) {
     skips += result == 0 && openListings > 0;
     return result;
 }
 
-int rmdir(const char* path) {
-    const int result = NEXT("rmdir", int (*)(const char*))(path);
-    skips += result == 0 && openListings > 0;
-    return result;
-}
+int unlink(const char* path) { return removal(NEXT("unlink", int (*)(const char*))(path)); }
+int rmdir(const char* path) { return removal(NEXT("rmdir", int (*)(const char*))(path)); }
