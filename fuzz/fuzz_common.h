@@ -9,6 +9,7 @@
 
 #include "rcp_launcher.h"
 #include "rcp_launcher_testing.h"
+#include "test_util.h"
 
 // A broken invariant is a finding: abort so that libFuzzer keeps the input.
 #define FUZZ_CHECK(cond) \

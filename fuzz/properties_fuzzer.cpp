@@ -6,7 +6,7 @@
 #include "fuzz_common.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    setlocale(LC_CTYPE, "C.UTF-8");
+    setlocale(LC_CTYPE, rcptest::utf8Locale());
     resetLoggingForTest();  // with debug output, which quotes every key and value
     std::ofstream("p.properties", std::ios::binary) << std::string(reinterpret_cast<const char*>(data), size);
     std::vector<String> props;

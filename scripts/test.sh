@@ -2,9 +2,9 @@
 # Builds and runs every test: a normal build with warnings as errors, its
 # end-to-end suite once more with the launcher under valgrind, the same suite
 # under AddressSanitizer + UndefinedBehaviorSanitizer, short bounded fuzzing
-# runs built with clang, on Linux a cross-build of the launcher for macOS, and
-# last the demo, which installs the normal build and checks it on a real
-# Equinox platform.
+# runs built with clang, on Linux a cross-build for macOS (the universal
+# launcher, every test program, the archive), and last the demo, which
+# installs the normal build and checks it on a real Equinox platform.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 root=$(pwd)
@@ -50,8 +50,9 @@ elif [ -f "$root/fuzz/CMakeLists.txt" ]; then
 fi
 
 if [ "$(uname -s)" = Linux ] && [ "$(uname -m)" = x86_64 ]; then
-  # Compiles and links only: nothing here can run a macOS program.
-  echo "=== macOS cross-build (x86_64, arm64) ==="
+  # Compiles, links, merges and packs only: nothing here can run a macOS
+  # program.
+  echo "=== macOS cross-build (universal launcher, tests, archive) ==="
   scripts/check-macos.sh
 else
   # On macOS the builds above are the real thing; the cross toolchain exists

@@ -36,26 +36,36 @@ struct PostSessionCommand {
     char parameter[256];
 };
 
+// Why the executable's path could not be resolved (realpath's errno), 0 when
+// it could. The messages that end a launch for want of that path report this
+// cause: the checks made since on the empty path would leave an unrelated
+// errno (ENOENT), and macOS's realpath refuses paths of 1,024 bytes or more.
+int unresolvedPathError = 0;
+
+// The line's system text names the same cause as its number.
 [[noreturn]] void executablePathFailed(int err) {
     snprintf(tempOutBuffer, sizeof(tempOutBuffer), "RLNCH0184E: Getting executable path failed! errno = %d", err);
+    errno = err;
     fatalErrorExit(tempOutBuffer);
 }
 
 // The raw path of the running executable as the system reports it.
 std::string systemExecutablePath() {
 #if defined(__APPLE__)
+    // It fails only when the buffer is too small, and sets no errno: the
+    // cause reported is then the launcher's own, a path too long.
     // 1024 bytes of path plus the terminator at first.
     std::vector<char> buffer(1025, '\0');
     uint32_t size = static_cast<uint32_t>(buffer.size());
     if (_NSGetExecutablePath(buffer.data(), &size) != 0) {
         // The buffer was too small; size now holds what is needed.
         if (size == 0 || size > EXE_PATH_LIMIT) {
-            executablePathFailed(errno);
+            executablePathFailed(ENAMETOOLONG);
         }
         buffer.assign(static_cast<size_t>(size) + 1, '\0');
         size = static_cast<uint32_t>(buffer.size());
         if (_NSGetExecutablePath(buffer.data(), &size) != 0) {
-            executablePathFailed(errno);
+            executablePathFailed(ENAMETOOLONG);
         }
     }
     buffer.back() = '\0';
@@ -101,6 +111,7 @@ void read_executable_path(std::string& path) {
     if (resolvedPath.empty()) {
         std::string raw = systemExecutablePath();
         char* resolved = realpath(raw.c_str(), nullptr);
+        unresolvedPathError = resolved == nullptr ? errno : 0;
         if (resolved != nullptr) {
             resolvedPath = resolved;
             free(resolved);
@@ -159,7 +170,10 @@ wchar_t* getRCPDirectory(int argc, wchar_t** argv) {
     if (isDirectory(dir)) {
         return dir;
     }
+    // For the caller's message: why the path is unknown, else why it is no directory.
+    const int err = unresolvedPathError != 0 ? unresolvedPathError : errno;
     freeString(dir);
+    errno = err;
     return nullptr;
 }
 
@@ -208,6 +222,7 @@ void getServiceInstallDir(std::wstring& serviceDir, std::wstring& installDir, in
         }
     }
     const wchar_t* program = argc > 0 ? argv[0] : L"";
+    if (unresolvedPathError != 0) errno = unresolvedPathError;
     fatalErrorExit("RLNCH0048E: Unable to locate the directory containing %ls", program);
 }
 

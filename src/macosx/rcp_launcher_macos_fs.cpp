@@ -17,6 +17,7 @@
 #include <cstring>
 #include <cwchar>
 #include <string>
+#include <vector>
 
 #include "rcp_launcher.h"
 
@@ -74,44 +75,51 @@ int createDirectory(const wchar_t* dir) {
 }
 
 int removeDirectoryContents(const std::string& dir, std::string& indent, std::string& errlist) {
-    int result = 1;
     DIR* listing = opendir(dir.c_str());
     if (listing == nullptr) {
         appendError(errlist, "Error in ", dir, errno);
         return 0;
     }
-    // errno tells the end of the listing from a listing error, so it is cleared
-    // before every read and after every entry.
+    // Every name is read before anything is removed: on HFS+ a listing that
+    // goes on while entries are removed may skip some, which would then stay
+    // and fail their directory's removal. (The listing is also closed before
+    // the recursion, so a deep tree does not hold a descriptor per level.)
+    // errno tells the end of the listing from a listing error, so it is
+    // cleared before every read.
+    std::vector<std::string> names;
     errno = 0;
-    struct dirent* entry;
-    while ((entry = readdir(listing)) != nullptr) {
-        const char* name = entry->d_name;
-        if (std::strcmp(name, ".") != 0 && std::strcmp(name, "..") != 0) {
-            std::string full = dir + "/" + name;
-            struct stat st;
-            if (stat(full.c_str(), &st) != 0) {
-                appendError(errlist, "Can't stat ", full, errno);
-                result = 0;
-            } else if (S_ISDIR(st.st_mode)) {
-                std::string deeper = indent + "  ";
-                int sub = removeDirectoryContents(full, deeper, errlist);
-                result = result && sub;
-                if (rmdir(full.c_str()) != 0) {
-                    appendError(errlist, "Can't delete dir ", full, errno);
-                    result = 0;
-                }
-            } else if (unlink(full.c_str()) != 0) {
-                appendError(errlist, "Can't delete file ", full, errno);
+    for (struct dirent* entry; (entry = readdir(listing)) != nullptr; errno = 0) {
+        if (std::strcmp(entry->d_name, ".") != 0 && std::strcmp(entry->d_name, "..") != 0) {
+            names.emplace_back(entry->d_name);
+        }
+    }
+    const int listingError = errno;
+    closedir(listing);
+    int result = 1;
+    for (const std::string& name : names) {
+        const std::string full = dir + "/" + name;
+        struct stat st;
+        if (stat(full.c_str(), &st) != 0) {
+            appendError(errlist, "Can't stat ", full, errno);
+            result = 0;
+        } else if (S_ISDIR(st.st_mode)) {
+            std::string deeper = indent + "  ";
+            int sub = removeDirectoryContents(full, deeper, errlist);
+            result = result && sub;
+            if (rmdir(full.c_str()) != 0) {
+                appendError(errlist, "Can't delete dir ", full, errno);
                 result = 0;
             }
+        } else if (unlink(full.c_str()) != 0) {
+            appendError(errlist, "Can't delete file ", full, errno);
+            result = 0;
         }
-        errno = 0;
     }
-    if (errno != 0) {
-        appendError(errlist, "readdir error ", "", errno);
+    // The listing's own failure comes last, after the entries it did show.
+    if (listingError != 0) {
+        appendError(errlist, "readdir error ", "", listingError);
         result = 0;
     }
-    closedir(listing);
     return result;
 }
 

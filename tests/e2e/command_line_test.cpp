@@ -60,7 +60,7 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         for (const char* harness : {"RCP_STUB_RECORD", "ASAN_OPTIONS", "UBSAN_OPTIONS", "LSAN_OPTIONS"})
             env.erase(harness);
         EXPECT_EQ(env, (std::map<std::string, std::string>{
-                           {"HOME", sb.home}, {"USER", "tester"}, {"PATH", "/usr/bin:/bin"}, {"LANG", "C.UTF-8"},
+                           {"HOME", sb.home}, {"USER", "tester"}, {"PATH", "/usr/bin:/bin"}, {"LANG", utf8Locale()},
                            {"JAVA_HIGH_ZIPFDS", "900"}, {"RCP_DEMO", "hello world"}, {"RCP_COUNTED", "yes"},
                            {"LD_LIBRARY_PATH", inst + "/lib:/opt/inherited/lib:/opt/append/lib"},
                            {"LD_PRELOAD", "/nonexistent/libpre.so"}}));

@@ -20,7 +20,9 @@
 // be on, so the /tmp cases hold either way: a link planted by the owner of
 // /tmp (root) is followed by the kernel for every user, and root itself may
 // remove any entry.
+#ifdef __linux__
 #include <sys/mount.h>
+#endif
 #include <sys/statvfs.h>
 
 #include <chrono>
@@ -81,6 +83,24 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
         return steps({file("%S/" + dir + "/rcplauncher.properties", launcherProps("user")), args(a),
                       [=](Sandbox& sb, Launch& o) { sb.installLauncher(o.program = sb.path(dir) + "/rcplauncher"); }});
     };
+    // A launcher whose real path is longer than the system allows (18 levels
+    // of 250 bytes), started through a short path of relative links. Linux
+    // cannot even name it; macOS can, but its realpath refuses paths of
+    // 1,024 bytes or more. Either way the line tells the cause.
+    const Prepare deep = [](Sandbox& sb, Launch& o) {
+        const std::string d(250, 'd'), level = d + "/" + d + "/" + d;
+        std::string at = sb.root;
+        for (int i = 0; i < 6; i++, at += "/l") {
+            makeDirs(at + (i ? "/" : "/deep/") + level);
+            ASSERT_EQ(symlink(((i ? "" : "deep/") + level).c_str(), (at + "/l").c_str()), 0);
+        }
+        sb.installLauncher(o.program = at + "/rcp/rcplauncher");
+    };
+#ifdef __APPLE__
+    const std::string tooLong = "RLNCH0049E: Unable to locate the platform's installation directory";
+#else
+    const std::string tooLong = "RLNCH0184E: Getting executable path failed! errno = " + std::to_string(ENAMETOOLONG);
+#endif
     // A reset after a first launch by the same user; for nobody, the
     // workspace directory is then root's (not writable for others) while all
     // in it is nobody's.
@@ -106,6 +126,7 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
         {"launcher in RCP", 0, true, launcherIn("inst/RCP", {}), noRcp, -1},
         {"launcher in rcpx", 0, true, launcherIn("inst/rcpx", {}), noRcp, -1},
         {"launcher in xrcp", 0, true, launcherIn("inst/xrcp", {}), noRcp, -1},
+        {"launcher deeper than the path limit", 0, true, deep, tooLong, ENAMETOOLONG},
         {"service launcher too shallow", 0, true, launcherIn("x", {"-initMUService"}),
          "RLNCH0048E: Unable to locate the directory containing %S/x/rcplauncher", -1},
         {"no launcher properties", 0, true, steps({[](Sandbox& sb, Launch&) { unlink(sb.props.c_str()); }, debug}),
@@ -301,6 +322,9 @@ TEST(Faults, InterruptedFirstLaunchesLeaveAUsableArea) {
         EXPECT_EQ(snapshot(sb.cfg), reference);
     }
 
+#ifndef __linux__
+    GTEST_SKIP() << "the full disk is a tmpfs mounted on the home, which only Linux offers";
+#else
     if (notRoot("a small tmpfs")) return;
     sb.freshHome();
     // A fresh tmpfs of that size as the home, or (MS_REMOUNT) the mounted one resized; 0: to what it holds now.
@@ -335,4 +359,5 @@ TEST(Faults, InterruptedFirstLaunchesLeaveAUsableArea) {
     EXPECT_EQ(lastLine(r.log),
               "RLNCH0020E: Error writing to " + sb.cfg + "/args.properties file. : " + strerror(ENOSPC));
     EXPECT_EQ(snapshot(sb.cfg), reference);
+#endif
 }

@@ -110,8 +110,8 @@ Result Sandbox::runMany(const std::vector<Launch>& launches) {
         // test run apply to the launcher as well; the launch's own settings
         // come last and win), and a wrapper without a slash is found on the
         // sandbox's PATH.
-        V args = {"/usr/bin/env", "-i", "HOME=" + home, "USER=tester", "PATH=/usr/bin:/bin", "LANG=C.UTF-8",
-                  "RCP_STUB_RECORD=" + recordDir};
+        V args = {"/usr/bin/env", "-i", "HOME=" + home, "USER=tester", "PATH=/usr/bin:/bin",
+                  "LANG=" + std::string(utf8Locale()), "RCP_STUB_RECORD=" + recordDir};
         for (const std::string name : {"ASAN_OPTIONS", "UBSAN_OPTIONS", "LSAN_OPTIONS"})
             if (getenv(name.c_str())) args.push_back(name + "=" + getenv(name.c_str()));
         for (const auto& kv : l.env) args.push_back(kv.first + "=" + kv.second);
@@ -151,12 +151,9 @@ Result Sandbox::runMany(const std::vector<Launch>& launches) {
     // A child records first thing; the last ones may still be starting.
     poll(15, [&] { return records(recordDir).size() >= expected; });
     res.children = records(recordDir);
-    for (Child& c : res.children) {
-        // Every launcher has ended, so a child that is still there is ours.
-        const pid_t r = waitpid(static_cast<pid_t>(c.pid), nullptr, WNOHANG);
-        c.reapedByLauncher = r == -1;
-        if (r == 0) kill(static_cast<pid_t>(c.pid), SIGKILL);
-    }
+    // Every launcher has ended: a child still there, running or a zombie left
+    // to this process (the subreaper), was not waited for; it ends now.
+    for (Child& c : res.children) c.reapedByLauncher = kill(static_cast<pid_t>(c.pid), SIGKILL) != 0;
     // Children of killed launchers, recorded or not, must be gone too.
     if (!poll(15, [] { return waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD; }))
         ADD_FAILURE() << "children left running";

@@ -15,7 +15,8 @@
 // Every run fails the test when a launcher wrote to the terminal. The test
 // process is a child subreaper (Linux), so children the launchers leave
 // behind are reaped here: a zombie still answers kill(pid, 0) and would make
-// the next launch believe a platform runs.
+// the next launch believe a platform runs. (Elsewhere the system reaps them
+// at once.)
 //
 // RCP_LAUNCHER_WRAPPER (blank-separated words, e.g. "valgrind -q") runs every
 // launcher under that command; RCP_LAUNCHER_BINARY names the launcher program
@@ -79,7 +80,9 @@ struct Child {
     long pid = 0;
     std::vector<std::string> argv;
     std::map<std::string, std::string> env;
-    bool reapedByLauncher = false;  // the launcher waited for it
+    // The launcher waited for it. Without a subreaper (macOS) a child that
+    // ended by itself before it was looked at counts as waited for too.
+    bool reapedByLauncher = false;
     // The index of arg (-1 when absent) and the argument after it ("" when none).
     int index(const std::string& arg) const {
         const auto at = std::find(argv.begin(), argv.end(), arg) - argv.begin();

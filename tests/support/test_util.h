@@ -1,11 +1,13 @@
-// Small file-system helpers shared by the unit and the end-to-end tests: a
-// throw-away directory and whole-file reads and writes.
+// Small helpers shared by the unit and the end-to-end tests and the fuzz
+// targets: a throw-away directory, whole-file reads and writes, and a UTF-8
+// locale.
 #ifndef RCP_TEST_UTIL_H
 #define RCP_TEST_UTIL_H
 
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <clocale>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
@@ -33,16 +35,27 @@ inline void makeDirs(const std::string& path) {
     mkdir(path.c_str(), 0755);
 }
 
-// A file, or a directory with everything below it, read-only ones included.
+// A file, or a directory with everything below it: read-only directories are
+// opened up first, and remove_all also reaches paths longer than PATH_MAX.
 inline void removeTree(const std::string& path) {
-    if (!isDir(path)) {
-        unlink(path.c_str());
-        return;
-    }
-    chmod(path.c_str(), 0700);
     std::error_code ec;
-    for (const auto& entry : std::filesystem::directory_iterator(path, ec)) removeTree(entry.path());
-    rmdir(path.c_str());
+    if (isDir(path) && chmod(path.c_str(), 0700) == 0)
+        for (std::filesystem::recursive_directory_iterator it(path, ec), end; it != end; it.increment(ec))
+            if (isDir(it->path())) chmod(it->path().c_str(), 0700);
+    std::filesystem::remove_all(path, ec);
+}
+
+// The name of a UTF-8 locale this machine has, for the tests' LANG and
+// LC_CTYPE: C.UTF-8 (glibc, recent macOS), else en_US.UTF-8 (macOS 13 and
+// earlier have no C.UTF-8).
+inline const char* utf8Locale() {
+    static const char* const name = [] {
+        const std::string previous = setlocale(LC_CTYPE, nullptr);
+        const char* found = setlocale(LC_CTYPE, "C.UTF-8") ? "C.UTF-8" : "en_US.UTF-8";
+        setlocale(LC_CTYPE, previous.c_str());
+        return found;
+    }();
+    return name;
 }
 
 // Writes text to path (creating parent directories), mode 0644 unless given.

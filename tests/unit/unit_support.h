@@ -21,7 +21,7 @@ using Pairs = std::vector<std::pair<std::wstring, std::wstring>>;
 
 // The locale of a launch, an empty log queue and no debug output.
 inline void resetState(installCfg cfg = undefined) {
-    setlocale(LC_CTYPE, "C.UTF-8");
+    setlocale(LC_CTYPE, utf8Locale());
     resetLoggingForTest();
     setDebug(false);
     eConfig = cfg;
