@@ -52,7 +52,7 @@ ExpandedArgPool expandedArgs;
 // Replaces every occurrence of placeholder by replacement, in one pass. The
 // search goes on after the inserted text, so a path that itself contains the
 // placeholder cannot make the replacement loop.
-bool replaceAll(wstring& text, const wchar_t* placeholder, const wstring& replacement) {
+bool replacePlaceholderEverywhere(wstring& text, const wchar_t* placeholder, const wstring& replacement) {
     const size_t phLen = wcslen(placeholder);
     size_t pos = text.find(placeholder);
     if (pos == wstring::npos) return false;
@@ -86,10 +86,11 @@ void substitutionInvalid(wstring text) {
 }  // namespace
 
 bool replaceStdPlaceholders(const wstring& workspaceLocation, const wstring& installDir, wstring& placeholderString) {
-    bool modified = replaceAll(placeholderString, RCPHOME_REPLACE, installDir);
-    modified = replaceAll(placeholderString, WORKSPACELOCATION_REPLACE, workspaceLocation) || modified;
+    bool modified = replacePlaceholderEverywhere(placeholderString, RCPHOME_REPLACE, installDir);
+    modified =
+        replacePlaceholderEverywhere(placeholderString, WORKSPACELOCATION_REPLACE, workspaceLocation) || modified;
     // The data area and the workspace are the same directory.
-    modified = replaceAll(placeholderString, RCPDATA_REPLACE, workspaceLocation) || modified;
+    modified = replacePlaceholderEverywhere(placeholderString, RCPDATA_REPLACE, workspaceLocation) || modified;
     return modified;
 }
 

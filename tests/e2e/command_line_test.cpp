@@ -11,10 +11,11 @@ using namespace rcptest;
 // the properties behind each VM argument, system property and -X option, the
 // jvm.properties beside an overriding JVM, the environment keys, and a
 // '-config NAME' extension of the launcher properties (its platform options
-// after the typed ones, its VM options after the typed VM arguments). The
-// child gets exactly this command line and environment, and nothing is
-// logged. (jvm.shareclasses.fullpath names no directory: nothing to empty,
-// nothing to report.)
+// after the typed ones, its VM options after the typed VM arguments), and a
+// HOME ending in "/". The child gets exactly this command line (no path
+// holds "//") and environment, and nothing is logged.
+// (jvm.shareclasses.fullpath names no directory: nothing to empty, nothing
+// to report.)
 TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
     for (const std::string configuration : {"user", "lockdown", "serial.multiuser", "multiuser", "userpb", "service"}) {
         SCOPED_TRACE("install.configuration=" + configuration);
@@ -32,9 +33,10 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         const std::string jvm2 = sb.path("inst/jvm2/jre/bin/java"), inst = sb.inst;
         sb.installStub(jvm2);
         sb.write("inst/jvm2/jvm.properties", "-Dfrom.jvm=1\nvmarg.z=-Dvz=1\n");
+        const std::string home = sb.home + "/";
         Result r = sb.run({{"-consoleLog", "-plugincustomization", "cmd.ini", "-resetconfig", "-foo", "-config", "x",
                             "-vm", jvm2, "-vmargs", "-Duser.vm=1"},
-                           {{"JAVA_HOME", "/opt/java"}, {"LD_LIBRARY_PATH", "/opt/inherited/lib"}}});
+                           {{"JAVA_HOME", "/opt/java"}, {"LD_LIBRARY_PATH", "/opt/inherited/lib"}, {"HOME", home}}});
         ASSERT_EQ(r.children.size(), 1u) << r.describe();
 
         const std::string ws = service ? inst + "/eclipse/.workspace" : sb.ws, area = service ? "" : "/rcp";
@@ -60,7 +62,7 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         for (const char* harness : {"RCP_STUB_RECORD", "ASAN_OPTIONS", "UBSAN_OPTIONS", "LSAN_OPTIONS"})
             env.erase(harness);
         EXPECT_EQ(env, (std::map<std::string, std::string>{
-                           {"HOME", sb.home}, {"USER", "tester"}, {"PATH", "/usr/bin:/bin"}, {"LANG", "C.UTF-8"},
+                           {"HOME", home}, {"USER", "tester"}, {"PATH", "/usr/bin:/bin"}, {"LANG", "C.UTF-8"},
                            {"JAVA_HIGH_ZIPFDS", "900"}, {"RCP_DEMO", "hello world"}, {"RCP_COUNTED", "yes"},
                            {"LD_LIBRARY_PATH", inst + "/lib:/opt/inherited/lib:/opt/append/lib"},
                            {"LD_PRELOAD", "/nonexistent/libpre.so"}}));

@@ -152,8 +152,10 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
          "RLNCH0190E: Unable to open source file %S/inst/base/rcpinstall.properties to be copied", EINVAL},
         {"update directory is a file", 0, false, file("%C/org.eclipse.update"),
          create + "%C/org.eclipse.update directory.", EEXIST},
+        // Not replaced either where the user may write its directory.
         {"read-only launcher properties of a package-builder install", 2, true,
-         file("%P", "rcp.base.location=${rcp.home}/base\njvm.location=/j\ninstall.configuration=userpb\n", 0444),
+         steps({file("%P", "rcp.base.location=${rcp.home}/base\njvm.location=/j\ninstall.configuration=userpb\n", 0444),
+                own("%S/inst/rcp", kNobody)}),
          "RLNCH0017E: Could not open %P to append rcp.install.id!", EACCES},
         // A reset moves the configuration area to "<area>bak" after removing
         // an older backup; when either cannot be done the area stays as it
