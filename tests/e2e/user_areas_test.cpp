@@ -189,6 +189,13 @@ TEST(UserAreas, ProvisioningSequence) {
             sb.write(sb.props, launcherProps(configuration) + "provisioning=true\n" + shipped);
             EXPECT_TRUE(platform(sb.run({{"-foo"}}))) << shipped;
         }
+        // But a launch that had to copy platform.xml again counts as a first
+        // launch, also when the copy fails (larger than a file may grow).
+        unlink((sb.cfg + "/org.eclipse.update/platform.xml").c_str());
+        sb.write(sb.base + "/platform.xml", std::string(9000, 'x') + "\n");
+        Launch limited{{"-foo"}};
+        limited.fileSizeLimit = 4096;
+        EXPECT_FALSE(platform(sb.run(limited)));
         // The installer asks: provisioning at the same level, without
         // "-userProvLaunch", its options passed on to the platform.
         const V installer = {"-rcpLauncherWait", "-provManifest", "m.xml"};
