@@ -158,7 +158,8 @@ void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wc
 void replaceFirstRcpHome(wstring& text, const wstring& installDir);
 
 // ===================== Install configuration (rcp_launcher_installcfg) =======
-// Sets eConfig (and IS_LOCKDOWN) from "install.configuration".
+// Sets eConfig (and IS_LOCKDOWN) from "install.configuration", and with it
+// the modes of the files the launcher creates from then on.
 bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArray, bool muservice);
 // What an install configuration means to the launcher: the one table that
 // every decision depending on the configuration reads.
@@ -166,7 +167,7 @@ struct InstallCfgTraits {
     const wchar_t* name;           // its "install.configuration" word and -Drcp.install.config (null: none)
     const wchar_t* coreSubFolder;  // its templates' folder below <core>/config
     const wchar_t* workspace;      // its areas below the installation directory; null: the user's own
-    const wchar_t* configArea;     // (-data, rcp.data or the home directory)
+    const wchar_t* configArea;     // (-data, rcp.data or the home directory), which no one else may write
     bool service;                  // the JVM itself is the child, with class path and main class
     bool initialLaunch;            // it may need an initial launch ("config.initial.N")
     bool provisions;               // it provisions a new level or a user's first launch

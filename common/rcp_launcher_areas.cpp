@@ -20,6 +20,19 @@ void removeOneTrailingSeparator(wstring& path) {
     if (!path.empty() && (path.back() == L'/' || path.back() == L'\\')) path.pop_back();
 }
 
+// A relative location (HOME=home, a relative "-data" or "rcp.data") is taken
+// from the launcher's current directory before anything is created or opened
+// in it: directories are made from the root (mkdirs) while files are opened
+// from the current directory, so a relative path would name two places. An
+// empty location stays as it is: the design builds the areas from the root
+// then ("/KEL/RCP/..." for an empty or unset HOME).
+void makeAbsolute(wstring& path) {
+    if (path.empty() || path[0] == L'/' || path[0] == L'\\') return;
+    wstring cwd;
+    if (!getCurrentDirectory(cwd)) fatalErrorExit("RLNCH0010E: Unable to create %ls directory.", path.c_str());
+    path = joinPath(cwd, path);
+}
+
 }  // namespace
 
 unsigned long getTick() { return static_cast<unsigned long>(std::time(nullptr)); }
@@ -81,6 +94,7 @@ int getWorkspaceLocation(wstring& workspaceLocation, std::vector<String>& rcpIns
         given = 0;
     }
     if (given) removeOneTrailingSeparator(workspaceLocation);
+    makeAbsolute(workspaceLocation);
     return given;
 }
 

@@ -49,5 +49,8 @@ bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArra
     // The multi-user service runs as its own configuration whatever the
     // installation says; the lockdown flag stays as read.
     if (muservice) eConfig = multiuser_service;
+    // Areas of one user are never writable by others; the shared areas of
+    // the service configurations follow the umask.
+    setPrivateFiles(installCfgTraits().workspace == nullptr);
     return true;
 }

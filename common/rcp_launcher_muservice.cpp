@@ -26,6 +26,9 @@ void createMUServiceWkspc(wstring& workspaceLocation, const wstring& installDir,
     replaceFirstRcpHome(baseLocation, installDir);
     workspaceLocation = joinPath(installDir, MUSVC_WORKSPACE_LOC);
     wstring configLocation = joinPath(installDir, MUSVC_CONFIG_LOC);
+    // The service's area is shared, also when a multi-user installation's
+    // provisioning prepares it: its files follow the umask.
+    setPrivateFiles(false);
     ensureDirectory(workspaceLocation);
     ensureDirectory(configLocation);
 

@@ -126,11 +126,18 @@ void addEnvJavaHighZipfds(std::vector<String>& rcpInstallPropertiesArray);
 void setPreload(const wchar_t* ldPreload, const wchar_t* IDString);
 
 // ===================== File system (rcp_launcher_macos_fs) ===================
+// From now on, directories and files that the launcher creates get no group
+// or other write permission when privateToUser (the umask may take away
+// more, never add), else what the umask leaves of 0775 and 0666. The lock
+// file is 0600 either way. Starts true; the umask is never changed, so the
+// child inherits it as it was.
+void setPrivateFiles(bool privateToUser);
 // open(2) for the layer's own use: close-on-exec, never blocking, and only a
 // regular file is kept (else -1 with errno EISDIR for a directory, EINVAL for
-// any other kind of file). flags add the access mode, O_CREAT, O_NOFOLLOW...
+// any other kind of file). flags add the access mode, O_CREAT, O_NOFOLLOW...;
+// a created file gets mode as setPrivateFiles allows.
 int openRegularFile(const char* path, int flags, int mode = 0);
-// One mkdir, mode 0775 (less the umask); an existing directory gives 0.
+// One mkdir, mode 0775 as setPrivateFiles allows; an existing directory gives 0.
 int createDirectory(const wchar_t* dir);
 // Remove everything below dir (dir itself stays), or the tree with dir, going
 // on past failures. Links to directories are followed. The error list gets one
@@ -190,6 +197,8 @@ int commitWorkFile(FILE* fp, const std::wstring& workPath, const std::wstring& f
 bool putWide(FILE* fp, const std::wstring& text);
 // The whole content of a regular file, when it is at most limit bytes.
 bool readSmallFile(const std::wstring& path, std::string& bytes, size_t limit);
+// The process's current directory; false (errno set) when it has none.
+bool getCurrentDirectory(std::wstring& dir);
 // $HOME, or "" when unset; returns envHome's text.
 const wchar_t* getUserHome(std::wstring& envHome);
 // Sleeps the whole number of seconds, also when a signal comes in between.

@@ -15,6 +15,7 @@
 
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <cwchar>
 #include <string>
@@ -25,6 +26,9 @@ namespace {
 
 const mode_t DIRECTORY_MODE = 0775;
 const mode_t FILE_MODE = 0666;
+
+// Permission bits never given to what the launcher creates (setPrivateFiles).
+mode_t privateMask = 022;
 
 // Size of the scratch area that receives one scanned item (bytes).
 const size_t READ_SCRATCH_SIZE = 204800;
@@ -105,9 +109,11 @@ void discardWorkFile(FILE* fp, const std::wstring& workPath) {
 
 }  // namespace
 
+void setPrivateFiles(bool privateToUser) { privateMask = privateToUser ? 022 : 0; }
+
 int createDirectory(const wchar_t* dir) {
     std::string path = toNarrow(dir);
-    return mkdir(path.c_str(), DIRECTORY_MODE) == 0 ? 1 : 0;
+    return mkdir(path.c_str(), DIRECTORY_MODE & ~privateMask) == 0 ? 1 : 0;
 }
 
 int removeDirectoryContents(const std::string& dir, std::string& indent, std::string& errlist) {
@@ -312,7 +318,7 @@ int readTemplateLine(FILE* in, std::wstring& line) {
 }
 
 int openRegularFile(const char* path, int flags, int mode) {
-    int fd = open(path, flags | O_NONBLOCK | O_CLOEXEC, mode);
+    int fd = open(path, flags | O_NONBLOCK | O_CLOEXEC, static_cast<mode_t>(mode) & ~privateMask);
     if (fd < 0) {
         return -1;
     }
@@ -394,6 +400,16 @@ bool readSmallFile(const std::wstring& path, std::string& bytes, size_t limit) {
     close(fd);
     bytes.resize(got);
     return got <= limit;
+}
+
+bool getCurrentDirectory(std::wstring& dir) {
+    char* cwd = getcwd(nullptr, 0);
+    if (cwd == nullptr) {
+        return false;
+    }
+    chartowstr(cwd, dir);
+    free(cwd);
+    return true;
 }
 
 const wchar_t* getUserHome(std::wstring& envHome) {
