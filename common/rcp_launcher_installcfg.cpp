@@ -25,6 +25,7 @@ const InstallCfgTraits TRAITS[] = {
     {MULTIUSER_CFG, CORE_SUBDIR_MUSERVICE, MUSVC_WORKSPACE_LOC, MUSVC_CONFIG_LOC, true, false, false, false},
     {USERPB_CFG, CORE_SUBDIR_PBUILDER, nullptr, nullptr, false, true, false, false},
 };
+static_assert(sizeof(TRAITS) / sizeof(TRAITS[0]) == userpb - service + 1, "one row per install configuration");
 
 }  // namespace
 
