@@ -54,7 +54,9 @@ String initMemString(String str1, const wchar_t* str2);  // wcscat, returns str1
 // A new String holding a copy of text.
 String copyString(const wchar_t* text);
 // dir + "/" + name (just dir when name is empty), in the platform's
-// separators: the one way a path is put together from its parts.
+// separators: the one way a path is put together from its parts. The join
+// adds no second separator where dir ends or name begins with one, and an
+// empty dir joins from the root: ("", "x") gives "/x".
 wstring joinPath(const wstring& dir, const wstring& name);
 // path in the platform's separators.
 wstring nativePath(wstring path);
@@ -156,7 +158,23 @@ void replacePlaceholdersInArgv(wstring workspaceLocation, wstring installDir, wc
 void replaceFirstRcpHome(wstring& text, const wstring& installDir);
 
 // ===================== Install configuration (rcp_launcher_installcfg) =======
+// Sets eConfig (and IS_LOCKDOWN) from "install.configuration", and with it
+// the modes of the files the launcher creates from then on.
 bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArray, bool muservice);
+// What an install configuration means to the launcher: the one table that
+// every decision depending on the configuration reads.
+struct InstallCfgTraits {
+    const wchar_t* name;           // its "install.configuration" word and -Drcp.install.config (null: none)
+    const wchar_t* coreSubFolder;  // its templates' folder below <core>/config
+    const wchar_t* workspace;      // its areas below the installation directory; null: the user's own
+    const wchar_t* configArea;     // (-data, rcp.data or the home directory), which no one else may write
+    bool service;                  // the JVM itself is the child, with class path and main class
+    bool initialLaunch;            // it may need an initial launch ("config.initial.N")
+    bool provisions;               // it provisions a new level or a user's first launch
+    bool provisionsServiceArea;    // provisioning also prepares the multi-user service's area
+};
+// The row of eConfig.
+const InstallCfgTraits& installCfgTraits();
 // service or multiuser_service: the JVM itself is the child, with the class
 // path and main class on its command line, instead of the Eclipse executable.
 bool isServiceConfig();
@@ -184,6 +202,8 @@ void addMainClassToCommandLine();
 void addUseDaemonToCommandLine();
 // "rcp.base.location" of props; RLNCH0011E when it is missing.
 wstring requireBaseLocation(const std::vector<String>& props);
+// "rcp.install.id" of props; RLNCH0005E when it is missing.
+String requireInstallID(const std::vector<String>& props);
 
 // ===================== VM arguments and system properties (rcp_launcher_cmdline_vmargs)
 void setArgProperty(wstring& prop, const wchar_t* key, const wchar_t* value);

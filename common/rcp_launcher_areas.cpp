@@ -20,6 +20,19 @@ void removeOneTrailingSeparator(wstring& path) {
     if (!path.empty() && (path.back() == L'/' || path.back() == L'\\')) path.pop_back();
 }
 
+// A relative location (HOME=home, a relative "-data" or "rcp.data") is taken
+// from the launcher's current directory before anything is created or opened
+// in it: directories are made from the root (mkdirs) while files are opened
+// from the current directory, so a relative path would name two places. An
+// empty location stays as it is: the design builds the areas from the root
+// then ("/KEL/RCP/..." for an empty or unset HOME).
+void makeAbsolute(wstring& path) {
+    if (path.empty() || path[0] == L'/' || path[0] == L'\\') return;
+    wstring cwd;
+    if (!getCurrentDirectory(cwd)) fatalErrorExit("RLNCH0010E: Unable to create %ls directory.", path.c_str());
+    path = joinPath(cwd, path);
+}
+
 }  // namespace
 
 unsigned long getTick() { return static_cast<unsigned long>(std::time(nullptr)); }
@@ -46,57 +59,43 @@ String getInstallID(wstring rcp_launcher_properties_file, std::vector<String>& r
 
     // Persist it so that every later launch finds the same identifier and so
     // the same default workspace. No line end is written first: a file whose
-    // last line lacks one gets the entry joined to that line.
-    FILE* fp = nullptr;
-    open_wfile(fp, rcp_launcher_properties_file.c_str(), L"a+");
-    if (fp == nullptr)
-        fatalErrorExit("RLNCH0017E: Could not open %ls to append rcp.install.id!",
-                       rcp_launcher_properties_file.c_str());
-    const wstring line = wstring(RCP_INSTALL_ID_PROPERTY) + EQUALS_CHAR + installID + NEWLINE;
-    // The line is formatted as a text without arguments, never handed to
-    // printf as a format.
-    const bool written = fputws(formatWithoutArgs(line).c_str(), fp) >= 0 && fflush(fp) == 0;
-    fclose(fp);
-    if (!written) fatalErrorExit("RLNCH0018E: Error while writing to %ls file.", rcp_launcher_properties_file.c_str());
+    // last line lacks one gets the entry joined to that line. The file is
+    // replaced whole, like every file the launcher writes, so a full disk
+    // cannot cut it; one this user may not write is refused (RLNCH0017E)
+    // rather than replaced, whatever its directory allows.
+    const wchar_t* file = rcp_launcher_properties_file.c_str();
+    const int appended = appendToFile(file, wstring(RCP_INSTALL_ID_PROPERTY) + EQUALS_CHAR + installID + NEWLINE);
+    if (appended < 0) fatalErrorExit("RLNCH0017E: Could not open %ls to append rcp.install.id!", file);
+    if (appended == 0) fatalErrorExit("RLNCH0018E: Error while writing to %ls file.", file);
     return installID;
 }
 
 int getWorkspaceLocation(wstring& workspaceLocation, std::vector<String>& rcpInstallPropertiesArray, int argc,
                          wchar_t** argv, wstring& installDir) {
-    if (eConfig == service) {
-        workspaceLocation = installDir + WORKSPACE_LOC;
-        return 1;
-    }
-    if (eConfig == multiuser_service) {
-        workspaceLocation = installDir + MUSVC_WORKSPACE_LOC;
+    if (const wchar_t* inInstall = installCfgTraits().workspace) {
+        workspaceLocation = joinPath(installDir, inInstall);
         return 1;
     }
 
+    int given = 1;
     // "-data" as the last argument has no value and is ignored.
     if (const wchar_t* data = optionValue(DATAARG, argc, argv)) {
         workspaceLocation = data;
-        removeOneTrailingSeparator(workspaceLocation);
-        return 1;
+    } else if (String rcpData = findProperty(RCP_DATA_PROPERTY, rcpInstallPropertiesArray)) {
+        workspaceLocation = rcpData;
+        if (!replaceUserPlaceholders(workspaceLocation, rcpInstallPropertiesArray))
+            fatalErrorExit("RLNCH0099E: rcp.data property is invalid (%ls)", workspaceLocation.c_str());
+    } else {
+        const wstring installID = requireInstallID(rcpInstallPropertiesArray);
+        wstring userName;
+        if (getEnv(USER_IN_ENV, userName) == nullptr) fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
+        wstring home;
+        workspaceLocation = joinPath(joinPath(getUserHome(home), USER_WORKSPACE_MIDDLE + installID), userName);
+        given = 0;
     }
-
-    String rcpData = findProperty(RCP_DATA_PROPERTY, rcpInstallPropertiesArray);
-    if (rcpData != nullptr) {
-        wstring expanded = rcpData;
-        if (!replaceUserPlaceholders(expanded, rcpInstallPropertiesArray))
-            fatalErrorExit("RLNCH0099E: rcp.data property is invalid (%ls)", expanded.c_str());
-        removeOneTrailingSeparator(expanded);
-        workspaceLocation = expanded;
-        return 1;
-    }
-
-    String installID = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
-    if (installID == nullptr) fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
-    wstring userName;
-    if (getEnv(USER_IN_ENV, userName) == nullptr) fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
-    wstring home;
-    getUserHome(home);
-    workspaceLocation = home + USER_WORKSPACE_MIDDLE + installID + L"/" + userName;
-    return 0;
+    if (given) removeOneTrailingSeparator(workspaceLocation);
+    makeAbsolute(workspaceLocation);
+    return given;
 }
 
 int getConfigurationLocation(wstring& configLocation, std::vector<String>& rcpInstallPropertiesArray, int argc,
@@ -104,16 +103,8 @@ int getConfigurationLocation(wstring& configLocation, std::vector<String>& rcpIn
     // Always computed first, so a bad workspace setting fails here as well.
     wstring workspace;
     const int result = getWorkspaceLocation(workspace, rcpInstallPropertiesArray, argc, argv, installDir);
-
-    if (eConfig == service) {
-        configLocation = installDir + CONFIG_LOC;
-        return 1;
-    }
-    if (eConfig == multiuser_service) {
-        configLocation = installDir + MUSVC_CONFIG_LOC;
-        return 1;
-    }
-    configLocation = workspace + CONFIG_SUBDIR;
+    const wchar_t* inInstall = installCfgTraits().configArea;
+    configLocation = inInstall != nullptr ? joinPath(installDir, inInstall) : joinPath(workspace, CONFIG_SUBDIR);
     return result;
 }
 

@@ -32,6 +32,12 @@ wstring requireBaseLocation(const std::vector<String>& props) {
     return wstring(baseLoc);
 }
 
+String requireInstallID(const std::vector<String>& props) {
+    String installID = findProperty(RCP_INSTALL_ID_PROPERTY, props);
+    if (installID == nullptr) fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
+    return installID;
+}
+
 void addVmToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
                         std::vector<String>& /*rcpLauncherPropertiesArray*/, int argc, wchar_t** argv) {
     // "-console" and "-consoleLog" change nothing here on this platform.
@@ -85,7 +91,7 @@ bool replaceJavaExecutableName(wstring& vmString, const wchar_t* origName, const
 }
 
 void addBaseEclipseToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
-    wstring baseLocEclipse = requireBaseLocation(rcpInstallPropertiesArray) + BASE_ECLIPSE_PATH;
+    wstring baseLocEclipse = joinPath(requireBaseLocation(rcpInstallPropertiesArray), BASE_ECLIPSE_PATH);
     if (isExecutable(baseLocEclipse.c_str()) != 1)
         fatalErrorExit("RLNCH0007E: %ls is not executable or does not exist.", baseLocEclipse.c_str());
     addPathToCommandLine(baseLocEclipse);
@@ -95,15 +101,14 @@ void addStartupToCommandLine(std::vector<String> propArray, int argc, wchar_t** 
     addArgToCommandLine(STARTUPARG);
     // A "-perfJar" without a value is ignored: the default jar is used.
     const wchar_t* perfJar = optionValue(PERFJARARG, argc, argv);
-    addArgToCommandLine(perfJar ? wstring(perfJar) : requireBaseLocation(propArray) + L"/" + LAUNCHER_JAR);
+    addArgToCommandLine(perfJar ? wstring(perfJar) : joinPath(requireBaseLocation(propArray), LAUNCHER_JAR));
 }
 
 void addClasspathToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
     if (eConfig == multiuser_service) {
         // The service always boots from the base plug-in's own startup.jar.
-        wstring startupJar = requireBaseLocation(rcpInstallPropertiesArray) + L"/" + STARTUP_JAR;
         addArgToCommandLine(CPARG);
-        addArgToCommandLine(startupJar);
+        addArgToCommandLine(joinPath(requireBaseLocation(rcpInstallPropertiesArray), STARTUP_JAR));
         return;
     }
     String cp = findProperty(CLASSPATH, rcpInstallPropertiesArray);

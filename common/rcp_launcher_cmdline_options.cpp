@@ -56,8 +56,7 @@ void addMainOptionsToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
         }
     }
 
-    if (findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray) == nullptr)
-        fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
+    requireInstallID(rcpInstallPropertiesArray);
 
     wstring location;
     getWorkspaceLocation(location, rcpInstallPropertiesArray, argc, argv, installDir);

@@ -8,31 +8,6 @@
 
 #include "rcp_launcher.h"
 
-namespace {
-
-const wchar_t* configurationName() {
-    switch (eConfig) {
-        case service:
-            return SERVICE_CFG;
-        case lockdown:
-            return LOCKDOWN_CFG;
-        case user:
-            return USER_CFG;
-        case serial_multiuser:
-            return SERIAL_USER_CFG;
-        case multiuser:
-        case multiuser_service:
-            return MULTIUSER_CFG;
-        case userpb:
-            return USERPB_CFG;
-        case undefined:
-        default:
-            return nullptr;
-    }
-}
-
-}  // namespace
-
 void setArgProperty(wstring& prop, const wchar_t* key, const wchar_t* value) {
     prop = key != nullptr ? key : L"";
     prop += EQUALS_CHAR;
@@ -93,12 +68,10 @@ void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
         addArgToCommandLine(commandArg);
     }
 
-    String IDString = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
-    if (IDString == nullptr) fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
-    setArgProperty(commandArg, D_RCP_INSTALL_ID_PROP, IDString);
+    setArgProperty(commandArg, D_RCP_INSTALL_ID_PROP, requireInstallID(rcpInstallPropertiesArray));
     addArgToCommandLine(commandArg);
 
-    const wchar_t* configName = configurationName();
+    const wchar_t* configName = installCfgTraits().name;
     if (configName == nullptr)
         fatalErrorExit("RLNCH0025E: The platform rcp.install.id must be provided for this configuration!");
     setArgProperty(commandArg, D_CONFIG, configName);
@@ -112,8 +85,8 @@ void addDashDToCommandLine(std::vector<String>& rcpInstallPropertiesArray,
         return true;
     });
 
-    wstring installArea = nativePath(installDir + INSTALL_AREA_DIR);
-    if (!exists(installArea.c_str())) installArea = nativePath(installDir + INSTALL_AREA_FALLBACK_DIR);
+    wstring installArea = joinPath(installDir, INSTALL_AREA_DIR);
+    if (!exists(installArea.c_str())) installArea = joinPath(installDir, INSTALL_AREA_FALLBACK_DIR);
     setArgProperty(commandArg, D_OSGI_INSTALL_AREA, installArea.c_str());
     addArgToCommandLine(commandArg);
 }

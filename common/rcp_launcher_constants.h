@@ -50,7 +50,10 @@ inline constexpr const wchar_t* SID_FILE = L".sid";
 inline constexpr const wchar_t* LOG_DIR = L"logs";
 inline constexpr const wchar_t* RCP_LOG_FILE = L"rcplauncher.log";
 inline constexpr const char* LOG_FILE = "/var/log/rcplauncher.log";
-inline constexpr const wchar_t* TEMP_LOG_DIR = L"/tmp";
+// The shared temporary directory: the log of a launch that ends early, and
+// the preload link "kel.rcp.<user>.<id>.<library>".
+inline constexpr const wchar_t* TEMP_DIR = L"/tmp";
+inline constexpr const wchar_t* TEMP_PREFIX = L"kel.rcp";
 inline constexpr const wchar_t* WORKSPACE_LOC = L"/eclipse/.workspace";
 inline constexpr const wchar_t* CONFIG_LOC = L"/eclipse/.config";
 inline constexpr const wchar_t* MUSVC_WORKSPACE_LOC = L"/eclipse/.muservice";
@@ -145,11 +148,6 @@ inline constexpr const wchar_t* ENV_JAVA_HIGH_ZIPFDS_ENV_VAR = L"JAVA_HIGH_ZIPFD
 inline constexpr const wchar_t* JAVA_HIGH_ZIPFDS_DEFAULT = L"500";
 inline constexpr const wchar_t* PATH_SEPARATOR = L":";
 inline constexpr const wchar_t* MUSERVICE_USER = L"muservice";
-inline constexpr const char* TEMPDIR_STRINGA = "/tmp";
-inline constexpr const char* TEMPPREFIX_STRINGA = "kel.rcp";
-inline constexpr const char* USER_IN_ENV_STRINGA = "USER";
-inline constexpr const char* LD_PRELOAD_ENV_VAR_A = "LD_PRELOAD";
-inline constexpr const char* DOT_CHARA = ".";
 
 // ---- Texts of single modules ----
 // Placeholder syntax
@@ -157,8 +155,6 @@ inline constexpr const wchar_t* PH_OPEN = L"${";
 inline constexpr wchar_t PH_CLOSE = L'}';
 inline constexpr const wchar_t* ENV_PREFIX = L"env.";
 inline constexpr const wchar_t* PROP_PREFIX = L"prop.";
-// Properties line format: skip white space (blank lines too), at most 2024 bytes
-inline constexpr const wchar_t* PROP_LINE_FORMAT = L" %2024[^\n]\n";
 // Template sub-folders below <core>/config and the startup record keys
 inline constexpr const wchar_t* CORE_CONFIG_DIR = L"config";
 inline constexpr const wchar_t* CORE_SUBDIR_MUSERVICE = L"muservice";
@@ -174,13 +170,9 @@ inline constexpr const wchar_t* BACKUP_SUFFIX = L"bak";
 inline constexpr const wchar_t* METADATA_DIR = L".metadata";
 inline constexpr const wchar_t* PLUGINS_DIR = L".plugins";
 // Per-user files: work names (".base": the plain copy of the base file while
-// the per-user file is being made), the line written for a JVM feature, and
-// the template line format (at most 2024 bytes; the trailing "\n" swallows
-// the line end and all white space after it, so blank lines and indentation
-// vanish).
+// the per-user file is being made) and the line written for a JVM feature.
 inline constexpr const wchar_t* WORK_FILE_SUFFIX = L".new";
 inline constexpr const wchar_t* BASE_COPY_SUFFIX = L".base";
 inline constexpr const wchar_t* FEATURE_LINE = L"<feature>";
-inline constexpr const wchar_t* LINE_SCAN_FORMAT = L"%2024[^\n]\n";
 
 #endif  // RCP_LAUNCHER_CONSTANTS_H

@@ -1,5 +1,6 @@
 // The install configuration: how this installation is deployed (one user,
-// shared read-only, locked down, a service...). Many later decisions test it.
+// shared read-only, locked down, a service...). Many later decisions test it,
+// each through the one table of what a configuration means.
 #include <cwchar>
 
 #include "rcp_launcher.h"
@@ -7,34 +8,50 @@
 installCfg eConfig = undefined;
 bool IS_LOCKDOWN = false;
 
-bool isServiceConfig() { return eConfig == service || eConfig == multiuser_service; }
+namespace {
+
+// One row per value of installCfg, in the order of the values (service = 1).
+const InstallCfgTraits TRAITS[] = {
+    // name, template sub-folder, workspace, configuration area, service, initial, provisions, service area
+    {SERVICE_CFG, L"", WORKSPACE_LOC, CONFIG_LOC, true, false, false, false},
+    {LOCKDOWN_CFG, CORE_SUBDIR_USER, nullptr, nullptr, false, false, true, true},
+    {USER_CFG, CORE_SUBDIR_USER, nullptr, nullptr, false, true, true, false},
+    {SERIAL_USER_CFG, L"", nullptr, nullptr, false, false, false, false},
+    {nullptr, L"", nullptr, nullptr, false, false, false, false},  // undefined
+    {MULTIUSER_CFG, CORE_SUBDIR_USER, nullptr, nullptr, false, true, true, true},
+    // The service of a multi-user installation is named "multiuser" to the
+    // platform; the word in the properties still means multiuser, the row
+    // above, which is met first.
+    {MULTIUSER_CFG, CORE_SUBDIR_MUSERVICE, MUSVC_WORKSPACE_LOC, MUSVC_CONFIG_LOC, true, false, false, false},
+    {USERPB_CFG, CORE_SUBDIR_PBUILDER, nullptr, nullptr, false, true, false, false},
+};
+static_assert(sizeof(TRAITS) / sizeof(TRAITS[0]) == userpb - service + 1, "one row per install configuration");
+
+}  // namespace
+
+const InstallCfgTraits& installCfgTraits() { return TRAITS[eConfig - service]; }
+
+bool isServiceConfig() { return installCfgTraits().service; }
 
 bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArray, bool muservice) {
-    IS_LOCKDOWN = false;
     const wchar_t* value = findProperty(CONFIGURATION_PROPERTY, rcpInstallPropertiesArray);
     if (value == nullptr) {
         // No line at all means a plain single-user installation; a value that
         // is there but unknown is deliberately not mapped to that default.
         SvcDebugOutA("RLNCH0041I: Missed install configuration in property file. Using default setting!");
         eConfig = user;
-    } else if (wcscmp(value, SERVICE_CFG) == 0) {
-        eConfig = service;
-    } else if (wcscmp(value, USER_CFG) == 0) {
-        eConfig = user;
-    } else if (wcscmp(value, SERIAL_USER_CFG) == 0) {
-        eConfig = serial_multiuser;
-    } else if (wcscmp(value, LOCKDOWN_CFG) == 0) {
-        eConfig = lockdown;
-        IS_LOCKDOWN = true;
-    } else if (wcscmp(value, USERPB_CFG) == 0) {
-        eConfig = userpb;
-    } else if (wcscmp(value, MULTIUSER_CFG) == 0) {
-        eConfig = multiuser;
     } else {
-        eConfig = undefined;
+        eConfig = undefined;  // exact, case-sensitive words only
+        for (int c = service; c <= userpb && eConfig == undefined; c++)
+            if (TRAITS[c - service].name != nullptr && wcscmp(value, TRAITS[c - service].name) == 0)
+                eConfig = static_cast<installCfg>(c);
     }
+    IS_LOCKDOWN = eConfig == lockdown;
     // The multi-user service runs as its own configuration whatever the
     // installation says; the lockdown flag stays as read.
     if (muservice) eConfig = multiuser_service;
+    // Areas of one user are never writable by others; the shared areas of
+    // the service configurations follow the umask.
+    setPrivateFiles(installCfgTraits().workspace == nullptr);
     return true;
 }

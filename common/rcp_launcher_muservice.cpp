@@ -24,8 +24,11 @@ void createMUServiceWkspc(wstring& workspaceLocation, const wstring& installDir,
 
     wstring baseLocation = requireBaseLocation(rcpLauncherPropertiesArray);
     replaceFirstRcpHome(baseLocation, installDir);
-    workspaceLocation = installDir + MUSVC_WORKSPACE_LOC;
-    wstring configLocation = installDir + MUSVC_CONFIG_LOC;
+    workspaceLocation = joinPath(installDir, MUSVC_WORKSPACE_LOC);
+    wstring configLocation = joinPath(installDir, MUSVC_CONFIG_LOC);
+    // The service's area is shared, also when a multi-user installation's
+    // provisioning prepares it: its files follow the umask.
+    setPrivateFiles(false);
     ensureDirectory(workspaceLocation);
     ensureDirectory(configLocation);
 
@@ -63,14 +66,14 @@ void startupMUService(int argc, wchar_t** argv) {
     wstring installDir;
     getServiceInstallDir(serviceDir, installDir, argc, argv);
 
-    wstring launcherPropsFile = serviceDir + RCP_LAUNCHER_PROPERTIES_FILE;
+    wstring launcherPropsFile = joinPath(serviceDir, RCP_LAUNCHER_PROPERTIES_FILE);
     std::vector<String> rcpLauncherPropertiesArray;
     std::vector<String> rcpInstallPropertiesArray;
     getProperties(launcherPropsFile, rcpLauncherPropertiesArray);
     SetInstallConfiguration(rcpLauncherPropertiesArray, true);
     getInstallID(launcherPropsFile, rcpLauncherPropertiesArray);
 
-    wstring workspaceLocation = installDir + MUSVC_WORKSPACE_LOC;
+    wstring workspaceLocation = joinPath(installDir, MUSVC_WORKSPACE_LOC);
     openWorkspace(workspaceLocation, argc, argv);
 
     createMUServiceWkspc(workspaceLocation, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc,

@@ -26,8 +26,12 @@ const size_t MAX_EXPANDED_LENGTH = 1u << 17;
 const size_t MAX_EXPANSION_STEPS = 4096;
 const size_t MAX_EXPANDED_TOTAL = 4u << 20;
 
-// How much of a failed value the RLNCH0088E line quotes.
+// How much of a value that ran into a bound the RLNCH0088E line quotes.
 const size_t QUOTED_VALUE_LIMIT = 256;
+
+// Set by replaceUserPlaceholders when the value it failed on ran into a
+// bound, rather than meeting a placeholder it cannot resolve.
+bool ranIntoBound = false;
 
 // The debug line is cut at 4096 bytes anyway; no need to copy more of a long
 // text into it.
@@ -52,7 +56,7 @@ ExpandedArgPool expandedArgs;
 // Replaces every occurrence of placeholder by replacement, in one pass. The
 // search goes on after the inserted text, so a path that itself contains the
 // placeholder cannot make the replacement loop.
-bool replaceAll(wstring& text, const wchar_t* placeholder, const wstring& replacement) {
+bool replacePlaceholderEverywhere(wstring& text, const wchar_t* placeholder, const wstring& replacement) {
     const size_t phLen = wcslen(placeholder);
     size_t pos = text.find(placeholder);
     if (pos == wstring::npos) return false;
@@ -76,20 +80,22 @@ void appendForLog(wstring& log, const wstring& text) {
     log.append(text, 0, LOG_TEXT_LIMIT - log.length());
 }
 
-// Ends the launch for a value that cannot be expanded. A value that ran away
-// can be megabytes long; the line names its beginning.
-void substitutionInvalid(wstring text) {
-    if (text.length() > QUOTED_VALUE_LIMIT) text = text.substr(0, QUOTED_VALUE_LIMIT) + L"...";
+// Ends the launch for a value that cannot be expanded, quoting it as far as
+// it was expanded. A value that ran into a bound can be megabytes long: the
+// line names only its beginning then.
+[[noreturn]] void substitutionInvalid(wstring text, bool bounded) {
+    if (bounded && text.length() > QUOTED_VALUE_LIMIT) text = text.substr(0, QUOTED_VALUE_LIMIT) + L"...";
     fatalErrorExit("RLNCH0088E: property substitution is invalid (%ls)", text.c_str());
 }
 
 }  // namespace
 
 bool replaceStdPlaceholders(const wstring& workspaceLocation, const wstring& installDir, wstring& placeholderString) {
-    bool modified = replaceAll(placeholderString, RCPHOME_REPLACE, installDir);
-    modified = replaceAll(placeholderString, WORKSPACELOCATION_REPLACE, workspaceLocation) || modified;
+    bool modified = replacePlaceholderEverywhere(placeholderString, RCPHOME_REPLACE, installDir);
+    modified =
+        replacePlaceholderEverywhere(placeholderString, WORKSPACELOCATION_REPLACE, workspaceLocation) || modified;
     // The data area and the workspace are the same directory.
-    modified = replaceAll(placeholderString, RCPDATA_REPLACE, workspaceLocation) || modified;
+    modified = replacePlaceholderEverywhere(placeholderString, RCPDATA_REPLACE, workspaceLocation) || modified;
     return modified;
 }
 
@@ -129,6 +135,7 @@ bool getPlaceholderValue(const wstring& key, wstring& value, const std::vector<S
 }
 
 bool replaceUserPlaceholders(wstring& prop_contents, const std::vector<String>& propArray) {
+    ranIntoBound = false;
     if (prop_contents.empty()) return true;
 
     size_t prop_lastIndex = prop_contents.length() - 1;
@@ -161,6 +168,7 @@ bool replaceUserPlaceholders(wstring& prop_contents, const std::vector<String>& 
         }
 
         if (++steps > MAX_EXPANSION_STEPS || prop_contents.length() > MAX_EXPANDED_LENGTH) {
+            ranIntoBound = true;
             bResult = false;
             break;
         }
@@ -197,7 +205,7 @@ bool replaceAllPlaceholders(const wstring& workspaceLocation, const wstring& ins
                             std::vector<String>& rcpInstallPropertiesArray) {
     bool modified = replaceStdPlaceholders(workspaceLocation, installDir, placeholderString);
     wstring temp = placeholderString;
-    if (!replaceUserPlaceholders(temp, rcpInstallPropertiesArray)) substitutionInvalid(temp);
+    if (!replaceUserPlaceholders(temp, rcpInstallPropertiesArray)) substitutionInvalid(temp, ranIntoBound);
     if (temp != placeholderString) {
         placeholderString = temp;
         modified = true;
@@ -217,7 +225,7 @@ void replacePlaceholdersInRcpInstallProp(wstring workspaceLocation, wstring inst
         wstring value = rcpInstallPropertiesArray[i];
         if (replaceAllPlaceholders(workspaceLocation, installDir, value, rcpInstallPropertiesArray)) {
             expandedTotal += value.length();
-            if (expandedTotal > MAX_EXPANDED_TOTAL) substitutionInvalid(value);
+            if (expandedTotal > MAX_EXPANDED_TOTAL) substitutionInvalid(value, true);
             String expanded = copyString(value.c_str());
             freeString(rcpInstallPropertiesArray[i]);
             rcpInstallPropertiesArray[i] = expanded;

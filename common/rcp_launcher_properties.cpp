@@ -150,10 +150,9 @@ void getProperties(const wstring& propFilePath, std::vector<String>& propArray) 
         }
         skipWhiteSpace = true;
 
-        int rc = readFile(fp, PROP_LINE_FORMAT, line);
-        // -1 is the end of the file. Nothing else is expected from this format;
+        // -1 is the end of the file. Nothing else is expected from this reader;
         // a read that converted nothing cannot make progress either.
-        if (rc != 1) break;
+        if (readPropertyLine(fp, line) != 1) break;
 
         SvcDebugOutW(L"RLNCH0032I: Prop Line = \"%s\"", line.c_str());
         if (!line.empty() && line[0] == L'#') continue;  // keeps a continuation going

@@ -26,7 +26,7 @@ bool isNewProvisioningLevel(const wchar_t* previous, const wchar_t* current) {
 }
 
 bool isInitialRequired(std::vector<String> rcpLauncherPropertiesArray, std::vector<String> rcpInstallPropertiesArray) {
-    if (eConfig != user && eConfig != userpb && eConfig != multiuser) return false;
+    if (!installCfgTraits().initialLaunch) return false;
 
     std::vector<std::pair<const wchar_t*, const wchar_t*>> initial;
     forEachProperty(CONFIG_INITIAL_PREFIX, rcpLauncherPropertiesArray, [&](const wchar_t* key, const wchar_t* value) {
@@ -65,7 +65,7 @@ void checkForProvisioning(const wstring& workspaceLocation, int argc, wchar_t** 
                           std::vector<String>& rcpLauncherPropertiesArray, const std::vector<wstring>& launchArgs) {
     String provisioning = findProperty(PROVISIONING, rcpLauncherPropertiesArray);
     if (provisioning == nullptr || wcscmp(provisioning, TRUE_VALUE) != 0) return;
-    if (eConfig != user && eConfig != multiuser && eConfig != lockdown) return;
+    if (!installCfgTraits().provisions) return;
 
     String provisionedVersion = findProperty(PROV_MANIFEST_VERSION, rcpInstallPropertiesArray);
     String provisionVersion = findProperty(PROV_MANIFEST_VERSION, rcpLauncherPropertiesArray);
@@ -80,7 +80,7 @@ void checkForProvisioning(const wstring& workspaceLocation, int argc, wchar_t** 
     getUserCmdString(workspaceLocation, argc, argv, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray,
                      true, !byInstaller);
 
-    if (eConfig == multiuser || eConfig == lockdown) {
+    if (installCfgTraits().provisionsServiceArea) {
         wstring serviceWorkspace = workspaceLocation;
         createMUServiceWkspc(serviceWorkspace, installDir, rcpInstallPropertiesArray, rcpLauncherPropertiesArray, argc,
                              argv);

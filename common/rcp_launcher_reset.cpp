@@ -106,7 +106,9 @@ void resetMetaDataDirs(const wstring& workspaceLocation, const wstring& configLo
     std::vector<String> props;
     getProperties(propsPath, props);
 
-    const wstring pluginsDir = joinPath(workspaceLocation, wstring(METADATA_DIR) + L"/" + PLUGINS_DIR);
+    // Written with a trailing "/", as the design names it: an empty
+    // "resetDir." value removes "<workspace>/.metadata/.plugins/" itself.
+    const wstring pluginsDir = joinPath(joinPath(workspaceLocation, METADATA_DIR), PLUGINS_DIR) + L"/";
 
     // Collected first, so that the file's strings are released before a
     // removal can end the launch.

@@ -70,11 +70,10 @@ void releaseEffectiveArgs(Startup& s) {
 // Installation directory, launcher properties, effective arguments, and
 // debug output decided again on those.
 void readLauncherProperties(Startup& s) {
+    // Empty for a launcher outside a directory named "rcp": its paths are
+    // then taken from the root ("/rcp/rcplauncher.properties").
     getInstallDir(s.installDir, s.argc, s.argv);
-    // A launcher outside a directory named "rcp" is reported as a lone NUL:
-    // that is the empty path for everything that follows.
-    s.installDir.resize(wcslen(s.installDir.c_str()));
-    s.rcp_launcher_properties_file = s.installDir + RCP_LAUNCHER_PROPERTIES_FILE;
+    s.rcp_launcher_properties_file = joinPath(s.installDir, RCP_LAUNCHER_PROPERTIES_FILE);
     getProperties(s.rcp_launcher_properties_file, s.rcpLauncherPropertiesArray);
 
     s.cargc = s.argc;
@@ -121,13 +120,12 @@ void reuseOrResetAreas(Startup& s) {
 // The user's own update site, and the installation's shared
 // extension marker copied into it when the installation has one.
 void prepareUserSite(Startup& s) {
-    const wstring siteLocation = s.workspaceLocation + SITE_LOC;
-    for (const wchar_t* child : {SITE_FEATURES_DIR, SITE_PLUGINS_DIR})
-        ensureDirectory(nativePath(siteLocation + child));
+    const wstring siteLocation = joinPath(s.workspaceLocation, SITE_LOC);
+    for (const wchar_t* child : {SITE_FEATURES_DIR, SITE_PLUGINS_DIR}) ensureDirectory(joinPath(siteLocation, child));
 
-    const wstring extLocation = nativePath(s.installDir + SHARED_EXTENSION_LOC);
+    const wstring extLocation = joinPath(s.installDir, SHARED_EXTENSION_LOC);
     if (exists(extLocation.c_str()))
-        copyFile(extLocation.c_str(), nativePath(siteLocation + ECLIPSE_EXTENSION_FILE).c_str());
+        copyFile(extLocation.c_str(), joinPath(siteLocation, ECLIPSE_EXTENSION_FILE).c_str());
 }
 
 // The startup record (main process only, with the arguments
@@ -152,7 +150,7 @@ wstring jvmPropertiesBeside(wstring vmString) {
         slash = vmString.rfind(L'/', i == 0 ? wstring::npos : slash - 1);
         if (slash == wstring::npos) return wstring();
     }
-    return vmString.substr(0, slash + 1) + JVM_PROPERTIES;
+    return joinPath(vmString.substr(0, slash), JVM_PROPERTIES);
 }
 
 // JVM properties appended to the installation properties. Returns

@@ -34,7 +34,15 @@ wstring nativePath(wstring path) {
     return path;
 }
 
-wstring joinPath(const wstring& dir, const wstring& name) { return nativePath(name.empty() ? dir : dir + L"/" + name); }
+wstring joinPath(const wstring& dir, const wstring& name) {
+    if (name.empty()) return nativePath(dir);
+    // One separator between the two, whichever side brings it: the join
+    // itself never makes "//". An empty dir joins from the root ("/name").
+    wstring path = dir;
+    if (!path.empty() && (path.back() == L'/' || path.back() == L'\\')) path.pop_back();
+    if (name[0] != L'/' && name[0] != L'\\') path += L'/';
+    return nativePath(path + name);
+}
 
 String copyString(const wchar_t* text) {
     if (text == nullptr) text = L"";

@@ -10,62 +10,52 @@
 
 namespace {
 
-// Template files live below <core>/config/<sub-folder>; the sub-folder
-// depends on the install configuration.
-const wchar_t* coreSubFolder() {
-    switch (eConfig) {
-        case multiuser_service:
-            return CORE_SUBDIR_MUSERVICE;
-        case user:
-        case multiuser:
-        case lockdown:
-            return CORE_SUBDIR_USER;
-        case userpb:
-            return CORE_SUBDIR_PBUILDER;
-        default:
-            return L"";
+// The values appended to the per-user file, in their order: the key written,
+// the launcher property it comes from, whether it is a path (backslashes made
+// "/", then escaped so that the reader gives the path back unchanged), and
+// whether the file cannot be completed without it (RLNCH0008E). The values are
+// the launcher properties' own texts; placeholders are expanded when the file
+// is read.
+struct AppendedValue {
+    const wchar_t* key;
+    const wchar_t* source;
+    bool path;
+    bool required;
+};
+constexpr AppendedValue APPENDED_VALUES[] = {
+    {RCP_INSTALL_ID_PROPERTY, RCP_INSTALL_ID_PROPERTY, false, true},
+    {RCP_DATA_PROPERTY, RCP_DATA_PROPERTY, true, false},
+    {VM, JVM_LOCATION, true, true},
+    {RCP_BASE_LOC_PROPERTY, RCP_BASE_LOC_PROPERTY, true, true},
+    {CONFIGURATION_PROPERTY, CONFIGURATION_PROPERTY, false, true},
+    {LOCALE_PROPERTY, LOCALE_PROPERTY, false, false},
+    {BIDI_PROPERTY, BIDI_PROPERTY, false, false},
+};
+
+bool hasRequiredValues(const std::vector<String>& props) {
+    for (const AppendedValue& v : APPENDED_VALUES)
+        if (v.required && findProperty(v.source, props) == nullptr) return false;
+    return true;
+}
+
+// "key=value\n" for every appended value the launcher properties hold.
+wstring appendedBlock(const std::vector<String>& props) {
+    wstring block;
+    for (const AppendedValue& v : APPENDED_VALUES) {
+        String value = findProperty(v.source, props);
+        if (value == nullptr) continue;
+        block += v.key;
+        block += EQUALS_CHAR;
+        if (v.path) {
+            wstring path = value;
+            convertBS2S(path);
+            convWcharTo8859_1_Value(path, block);
+        } else {
+            block += value;
+        }
+        block += NEWLINE;
     }
-}
-
-// The launcher properties without which the per-user file cannot be
-// completed (RLNCH0008E).
-constexpr const wchar_t* REQUIRED_LAUNCHER_VALUES[] = {RCP_INSTALL_ID_PROPERTY, JVM_LOCATION, RCP_BASE_LOC_PROPERTY,
-                                                       CONFIGURATION_PROPERTY};
-
-// Reads the next line of a template; false at the end of the file. The
-// line format swallows the white space after each line, so the scan can meet
-// a line end only at the very start of a file: such leading empty lines are
-// skipped like every other blank line (with the indentation after them).
-bool readTemplateLine(FILE* in, wstring& line) {
-    int scanResult = readFile(in, LINE_SCAN_FORMAT, line);
-    if (scanResult == 0) scanResult = readFile(in, PROP_LINE_FORMAT, line);
-    return scanResult > 0;
-}
-
-// Appends "key=value\n" with the value as the launcher properties hold it.
-// Returns false when the property is absent.
-bool appendPlain(wstring& block, const wchar_t* key, const wchar_t* sourceKey, const std::vector<String>& props) {
-    String value = findProperty(sourceKey, props);
-    if (value == nullptr) return false;
-    block += key;
-    block += EQUALS_CHAR;
-    block += value;
-    block += NEWLINE;
-    return true;
-}
-
-// Appends "key=value\n" for a path: backslashes made "/", then escaped so
-// that the properties reader gives the path back unchanged.
-bool appendPath(wstring& block, const wchar_t* key, const wchar_t* sourceKey, const std::vector<String>& props) {
-    String value = findProperty(sourceKey, props);
-    if (value == nullptr) return false;
-    wstring path = value;
-    convertBS2S(path);
-    block += key;
-    block += EQUALS_CHAR;
-    convWcharTo8859_1_Value(path, block);
-    block += NEWLINE;
-    return true;
+    return block;
 }
 
 void writeCopiedLine(FILE* out, const wstring& line) {
@@ -79,9 +69,11 @@ void writeCopiedLine(FILE* out, const wstring& line) {
 
 wstring getCoreFileLocation(const wstring& coreLocation, const wchar_t* filename) {
     const wstring name = filename != nullptr ? filename : L"";
-    // An empty sub-folder deliberately leaves "config//name": the path is
-    // still valid and matches what existing installations expect.
-    const wstring candidate = joinPath(coreLocation, wstring(CORE_CONFIG_DIR) + L"/" + coreSubFolder() + L"/" + name);
+    // Built as one name, so that an empty sub-folder deliberately leaves the
+    // design's "config//name": the path is still valid and matches what
+    // existing installations expect.
+    const wstring subFolder = installCfgTraits().coreSubFolder;
+    const wstring candidate = joinPath(coreLocation, wstring(CORE_CONFIG_DIR) + L"/" + subFolder + L"/" + name);
     if (exists(candidate.c_str())) return candidate;
 
     return joinPath(coreLocation, name);
@@ -105,9 +97,7 @@ wstring createRCPInstallProps(const wstring& workspaceLocation, const wstring& c
     // Without the required values the launch ends while the copy is
     // completed; the plain copy is then meant to stay under the per-user
     // name, as the administrator's evidence, and is kept by later launches.
-    bool complete = true;
-    for (const wchar_t* key : REQUIRED_LAUNCHER_VALUES)
-        if (findProperty(key, propsArray) == nullptr) complete = false;
+    const bool complete = hasRequiredValues(propsArray);
     wstring inPath = complete ? copyPath : propPath;
     if (!complete) moveFile(copyPath.c_str(), propPath.c_str());
 
@@ -151,7 +141,7 @@ int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propP
     bool bPropertyContinuation = false;         // a kept property continues on the next line
     bool bInvalidPropertyContinuation = false;  // a dropped property continues on the next line
     wstring line;
-    while (!feof(in) && readTemplateLine(in, line)) {
+    while (!feof(in) && readTemplateLine(in, line) > 0) {
         if (bInvalidPropertyContinuation) {
             bInvalidPropertyContinuation = isContinuationLine(line);
             bPropertyContinuation = false;
@@ -179,20 +169,9 @@ int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propP
     }
     fclose(in);
 
-    // The values this launch computed, in a fixed order. The reader takes
-    // the first occurrence of a key, so a key already in the base file keeps
-    // the base file's value.
-    wstring block;
-    int missing = 0;
-    if (!appendPlain(block, RCP_INSTALL_ID_PROPERTY, RCP_INSTALL_ID_PROPERTY, propsArray)) missing++;
-    appendPath(block, RCP_DATA_PROPERTY, RCP_DATA_PROPERTY, propsArray);
-    if (!appendPath(block, VM, JVM_LOCATION, propsArray)) missing++;
-    if (!appendPath(block, RCP_BASE_LOC_PROPERTY, RCP_BASE_LOC_PROPERTY, propsArray)) missing++;
-    if (!appendPlain(block, CONFIGURATION_PROPERTY, CONFIGURATION_PROPERTY, propsArray)) missing++;
-    appendPlain(block, LOCALE_PROPERTY, LOCALE_PROPERTY, propsArray);
-    appendPlain(block, BIDI_PROPERTY, BIDI_PROPERTY, propsArray);
-
-    if (missing > 0) {
+    // The values this launch computed. The reader takes the first occurrence
+    // of a key, so a key already in the base file keeps the base file's value.
+    if (!hasRequiredValues(propsArray)) {
         // The plain copy stays in place (and the work file beside it).
         fclose(out);
         fatalErrorExit(
@@ -202,7 +181,7 @@ int fixUserRCPInstallProperties(const wstring& workspaceLocation, wstring& propP
     // The block is expanded as a text without arguments ("%%" gives "%"),
     // never handed to printf as a format. Only a work file whose every line
     // reached the disk counts as written.
-    putWide(out, formatWithoutArgs(block));
+    putWide(out, formatWithoutArgs(appendedBlock(propsArray)));
     if (!finishWorkFile(out, outPath)) {
         SvcDebugOutA("RLNCH0015E: Unable to append values to user specific rcpinstall.properties file.");
         return -1;
@@ -258,24 +237,27 @@ int createPlatformXML(const wstring& configLocation, const wstring& baseLocation
     rewind(in);
     wstring line;
     bool written = true;
-    while (written && !feof(in) && readTemplateLine(in, line)) {
+    while (written && !feof(in) && readTemplateLine(in, line) > 0) {
         // The JVM's feature is filled in by the platform at run time.
         if (line.find(JVM_FEATUREID_REPLACE) != wstring::npos) line = FEATURE_LINE;
         if (line.find(JVM_PARENT_FEATUREID_REPLACE) != wstring::npos) line = FEATURE_LINE;
         written = putWide(out, line + NEWLINE);
     }
     fclose(in);
+    // A copy that was begun counts as this launch's first launch into the
+    // area, whether or not it could be finished (as the design has it): a
+    // user who is missing the file is provisioned again.
+    userFirstLaunch = true;
     // A failed write leaves the stream's error flag set, so this also covers
     // what only the flush and the close report (a full disk).
     if (!finishWorkFile(out, work)) {
         SvcDebugOutA("RLNCH0103E: Error while copying platform.xml to user specific platform.xml file.");
-        return -1;
+        return 0;
     }
     if (!moveFile(work.c_str(), target.c_str())) {
         SvcDebugOutW(L"RLNCH0105E: Unable to open platform.xml for writing.\"%s\"", target.c_str());
         deleteFile(work.c_str());
         return -1;
     }
-    userFirstLaunch = true;
     return 0;
 }

@@ -40,13 +40,8 @@ void writeLine(const std::string& line) {
 
 // vsnprintf into the fixed line buffer; a format error yields an empty text
 // rather than whatever the buffer held.
-size_t formatInto(char* buf, size_t size, const char* fmt, va_list ap) {
-    int n = vsnprintf(buf, size, fmt, ap);
-    if (n < 0) {
-        buf[0] = '\0';
-        return 0;
-    }
-    return static_cast<size_t>(n) >= size ? size - 1 : static_cast<size_t>(n);
+void formatInto(char* buf, size_t size, const char* fmt, va_list ap) {
+    if (vsnprintf(buf, size, fmt, ap) < 0) buf[0] = '\0';
 }
 
 void output_doit(const char* fmt, va_list ap) {
@@ -65,22 +60,13 @@ void Output(const char* fmt, ...) {
     va_end(ap);
 }
 
-void err_doit(int savedErrno, const char* fmt, va_list ap) {
+// One error line: the text, " : " and the system's text for savedErrno, cut
+// at the line buffer's size (a text that fills it leaves no room for the
+// suffix).
+void writeErrorLine(int savedErrno, const char* text) {
     char buf[LINE_BUFFER_SIZE];
-    size_t len = formatInto(buf, sizeof buf, fmt, ap);
-    snprintf(buf + len, sizeof buf - len, " : %s", strerror(savedErrno));
-    std::string line(buf);
-    line += '\n';
-    writeLine(line);
-}
-
-void errorLine(const char* fmt, ...) __attribute__((format(printf, 1, 2)));
-void errorLine(const char* fmt, ...) {
-    int savedErrno = errno;
-    va_list ap;
-    va_start(ap, fmt);
-    err_doit(savedErrno, fmt, ap);
-    va_end(ap);
+    snprintf(buf, sizeof buf, "%s : %s", text, strerror(savedErrno));
+    writeLine(std::string(buf) + '\n');
 }
 
 // A text that is used as a format although it may carry data. The k-th
@@ -220,7 +206,7 @@ bool openLog(const std::wstring& logLocation, bool mustBeOwn) {
 
 bool enableLogging(const std::wstring& logLocation) { return openLog(logLocation, false); }
 
-bool dumpLogToTempLocation() { return openLog(TEMP_LOG_DIR, true); }
+bool dumpLogToTempLocation() { return openLog(TEMP_DIR, true); }
 
 void SvcDebugOutA(const char* fString) {
     if (!debug || strlen(fString) >= MAX_DEBUG_FORMAT) return;
@@ -284,10 +270,12 @@ void GetLastErrorMsg(std::wstring& werrorString) {
 
 void fatalError(const char* fmt, ...) {
     int savedErrno = errno;
+    char buf[LINE_BUFFER_SIZE];
     va_list ap;
     va_start(ap, fmt);
-    err_doit(savedErrno, fmt, ap);
+    formatInto(buf, sizeof buf, fmt, ap);
     va_end(ap);
+    writeErrorLine(savedErrno, buf);
 }
 
 namespace {
@@ -295,8 +283,7 @@ namespace {
 // One error line of an already formatted text, with the system text of the
 // errno that held when the caller was entered; then, if asked, the end.
 void reportError(int savedErrno, const std::string& text, bool bExit) {
-    errno = savedErrno;
-    errorLine("%s", text.c_str());
+    writeErrorLine(savedErrno, text.c_str());
     if (bExit) exitSequence();
 }
 

@@ -6,6 +6,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <clocale>
 #include <cstring>
@@ -37,58 +38,61 @@ bool haveLaunchOption(const char* option, char** cargs, int argCount) {
 
 void setSemVersion(wchar_t* /*id*/) {}
 
+long startChild(const std::vector<wstring>& args, const char* beginLine, const char* endLine, bool wait,
+                void (*inParent)(long childPid)) {
+    // The narrow argument vector handed to execv, logged as it goes.
+    std::vector<std::string> narrow(args.size());
+    std::vector<char*> cargs;
+    SvcDebugOutA(beginLine);
+    for (size_t i = 0; i < args.size(); ++i) {
+        wstrtocs(narrow[i], args[i]);
+        cargs.push_back(&narrow[i][0]);
+        SvcDebugOutA("%s", cargs.back());
+    }
+    cargs.push_back(nullptr);
+    SvcDebugOutA(endLine);
+    if (args.empty()) return -1;  // nothing to start: the command line was never built
+
+    const pid_t child = fork();
+    if (child == 0) {
+        execv(cargs[0], cargs.data());
+        return 0;  // the program could not be started: the caller decides how this process ends
+    }
+    if (inParent != nullptr) inParent(child);
+    while (wait && child > 0 && waitpid(child, nullptr, 0) == -1 && errno == EINTR) {
+    }
+    return child;
+}
+
 namespace {
 
-// The narrow argument vector handed to execv.
-char** buildNativeArgs(size_t& size) {
-    size = launchArgs.size();
-    char** cargs = new char*[size + 1];
-    SvcDebugOutA("RLNCH0132I: ===== Begin Parameters =====");
-    for (size_t i = 0; i < size; ++i) {
-        std::string narrow;
-        wstrtocs(narrow, launchArgs[i]);
-        cargs[i] = new char[narrow.size() + 1];
-        memcpy(cargs[i], narrow.c_str(), narrow.size() + 1);
-        SvcDebugOutA("%s", cargs[i]);
-    }
-    cargs[size] = nullptr;
-    SvcDebugOutA("RLNCH0133I: ===== End Parameters =====");
-    return cargs;
+// The parent's part of a launch, before any wait: the lock file names the
+// child and is released for it. A failed fork has no process to record:
+// writing -1 would make every later launch believe a platform is running.
+void recordChild(long childPid) {
+    if (childPid > 0) populateLockFile(static_cast<int>(childPid));
+    unlockLockFile();
 }
 
 }  // namespace
 
 void launchEclipse(int argc, wchar_t** wargv) {
-    size_t size = 0;
-    char** cargs = buildNativeArgs(size);
-    if (size == 0) {  // nothing to start: the command line was never built
-        delete[] cargs;
-        return;
-    }
-
-    pid_t childPid = fork();
-    if (childPid == 0) {
-        execv(cargs[0], cargs);
-        // The program could not be started. The child ends quietly with
-        // status 0; _exit keeps it from flushing the parent's streams a
-        // second time.
+    const bool wait = findOption(RCPLAUNCHERWAIT, argc, wargv) != -1 ||
+                      std::find(launchArgs.begin(), launchArgs.end(), CONSOLEARG) != launchArgs.end();
+    // A child whose program could not be started ends quietly with status 0;
+    // _exit keeps it from flushing the parent's streams a second time.
+    if (startChild(launchArgs, "RLNCH0132I: ===== Begin Parameters =====", "RLNCH0133I: ===== End Parameters =====",
+                   wait, recordChild) == 0)
         _exit(0);
-    }
+}
 
-    // A failed fork has no process to record: writing -1 would make every
-    // later launch believe a platform is running.
-    if (childPid > 0) populateLockFile(static_cast<int>(childPid));
-    unlockLockFile();
-
-    bool wait =
-        findOption(RCPLAUNCHERWAIT, argc, wargv) != -1 || haveLaunchOption("-console", cargs, static_cast<int>(size));
-    if (wait && childPid > 0) {
-        int status = 0;
-        while (waitpid(childPid, &status, 0) == -1 && errno == EINTR) {
-        }
-    }
-    for (size_t i = 0; i < size; ++i) delete[] cargs[i];
-    delete[] cargs;
+void doProvisioning(std::vector<String>& /*launcherPropsArray*/, std::vector<String>& /*installPropsArray*/,
+                    const wchar_t* /*executable*/, const std::vector<std::wstring>& launchArgs) {
+    // The launcher waits for the provisioning run; a child whose program
+    // could not be started goes on like the parent: it releases the lock and
+    // ends with status 0.
+    startChild(launchArgs, "RLNCH0129I: ===== Begin Provisioning Parameters =====",
+               "RLNCH0130I: ===== End Provisioning Parameters =====", true, nullptr);
 }
 
 int launcherMain(int argc, char** argv) {

@@ -32,8 +32,8 @@ bool isOwnLinkTo(const std::string& linkPath, const std::string& target) {
 }
 
 void logPreloadVariable() {
-    const char* value = getenv(LD_PRELOAD_ENV_VAR_A);
-    SvcDebugOutA("setPreload():getenv LD_PRELOAD=%s", value != nullptr ? value : "(null)");
+    wstring value;
+    SvcDebugOutW(L"setPreload():getenv LD_PRELOAD=%s", getEnv(LD_PRELOAD_ENV_VAR, value) ? value.c_str() : L"(null)");
 }
 
 }  // namespace
@@ -95,9 +95,7 @@ void addLibpathToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
 void addLdPreloadToCommandLine(std::vector<String>& rcpInstallPropertiesArray) {
     String ldPreload = findProperty(LD_PRELOAD, rcpInstallPropertiesArray);
     if (ldPreload == nullptr) return;
-    String IDString = findProperty(RCP_INSTALL_ID_PROPERTY, rcpInstallPropertiesArray);
-    if (IDString == nullptr) fatalErrorExit("RLNCH0005E: Couldn't find the rcp.install.id property!");
-    setPreload(ldPreload, IDString);
+    setPreload(ldPreload, requireInstallID(rcpInstallPropertiesArray));
 }
 
 void setPreload(const wchar_t* ldPreload, const wchar_t* IDString) {
@@ -112,25 +110,23 @@ void setPreload(const wchar_t* ldPreload, const wchar_t* IDString) {
 
     // The preload variable is split at blanks, so a path with blanks is
     // reached through a link of our own under /tmp.
-    std::string IDStringA;
-    wstrtocs(IDStringA, IDString != nullptr ? IDString : L"");
     SvcDebugOutA("setPreload():found property: library.preload=%s", ldPreloadA.c_str());
     if (existsA(ldPreloadA.c_str()) != 1) {
         logPreloadVariable();
         return;
     }
 
-    size_t filenamePos = ldPreloadA.rfind('/');
-    if (filenamePos == std::string::npos)
-        fatalErrorExit("RLNCH0189E: Couldn't find filename for library.preload property");
-    std::string preloadName = ldPreloadA.substr(filenamePos + 1);
-    SvcDebugOutA("setPreload():library name = %s", preloadName.c_str());
+    const wchar_t* preloadName = wcsrchr(ldPreload, L'/');
+    if (preloadName == nullptr) fatalErrorExit("RLNCH0189E: Couldn't find filename for library.preload property");
+    SvcDebugOutW(L"setPreload():library name = %s", ++preloadName);
 
-    const char* userName = getenv(USER_IN_ENV_STRINGA);
-    if (userName == nullptr) fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
+    wstring userName;
+    if (getEnv(USER_IN_ENV, userName) == nullptr) fatalErrorExit("RLNCH0006E: Couldn't find the user name!");
 
-    std::string linkPath = std::string(TEMPDIR_STRINGA) + "/" + TEMPPREFIX_STRINGA + DOT_CHARA + userName + DOT_CHARA +
-                           IDStringA + DOT_CHARA + preloadName;
+    const wstring link = joinPath(TEMP_DIR, wstring(TEMP_PREFIX) + L"." + userName + L"." +
+                                                (IDString != nullptr ? IDString : L"") + L"." + preloadName);
+    std::string linkPath;
+    wstrtocs(linkPath, link);
     SvcDebugOutA("setPreload():linkPath=%s", linkPath.c_str());
 
     // Decide on what is really there (lstat, no link followed). Only our own
@@ -157,7 +153,7 @@ void setPreload(const wchar_t* ldPreload, const wchar_t* IDString) {
     }
 
     if (isOwnLinkTo(linkPath, ldPreloadA)) {
-        setenv(LD_PRELOAD_ENV_VAR_A, linkPath.c_str(), 1);
+        setEnv(LD_PRELOAD_ENV_VAR, link.c_str(), true);
         SvcDebugOutA("setPreload():setting LD_PRELOAD=%s", linkPath.c_str());
     } else {
         SvcDebugOutA("setPreload(): link path is not our link to the library; LD_PRELOAD not set.");

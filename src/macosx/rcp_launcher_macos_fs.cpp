@@ -1,6 +1,7 @@
 // File-system services of the launcher: directory creation and removal, the
-// text copy of the launcher's own files, rename/delete, the existence tests,
-// the one-item reader used by the properties code, and wide-oriented streams.
+// copy of the launcher's own files, rename/delete, the existence tests, the
+// line readers of the properties and template files, and the work files
+// through which every file written for the user appears complete.
 //
 // Every wide path is converted to the locale's multibyte form right before the
 // system call. Nothing here writes to the log except copyFile, whose failures
@@ -14,6 +15,7 @@
 
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <cwchar>
 #include <string>
@@ -24,6 +26,10 @@
 namespace {
 
 const mode_t DIRECTORY_MODE = 0775;
+const mode_t FILE_MODE = 0666;
+
+// Permission bits never given to what the launcher creates (setPrivateFiles).
+mode_t privateMask = 022;
 
 // Size of the scratch area that receives one scanned item (bytes).
 const size_t READ_SCRATCH_SIZE = 204800;
@@ -51,27 +57,64 @@ std::string toNarrow(const wchar_t* path) {
     return out;
 }
 
-// The two line formats the launcher reads with, in the C library's form,
-// converted once; each converts one item of at most 2024 bytes, which the
-// scratch area holds. Any other format is refused rather than handed to
-// fscanf, which would write through arguments that were never passed.
-const char* lineFormat(const wchar_t* mode) {
-    static const std::string propLine = toNarrow(PROP_LINE_FORMAT);
-    static const std::string templateLine = toNarrow(LINE_SCAN_FORMAT);
-    if (wcscmp(mode, PROP_LINE_FORMAT) == 0) {
-        return propLine.c_str();
+// The line formats of the two readers; each converts one item of at most
+// 2024 bytes, which the scratch area holds. A properties line begins after
+// any white space (blank lines too); after a template line the "\n" swallows
+// the line end and all white space that follows, so blank lines and
+// indentation vanish.
+const char PROPERTY_LINE_FORMAT[] = " %2024[^\n]\n";
+const char TEMPLATE_LINE_FORMAT[] = "%2024[^\n]\n";
+
+int readLine(FILE* in, const char* format, std::wstring& line) {
+    // The properties reader calls this once per line; one scratch area serves
+    // every call instead of a fresh 200 KB allocation each time.
+    static char scratch[READ_SCRATCH_SIZE];
+    line.clear();
+    if (in == nullptr) {
+        return EOF;
     }
-    if (wcscmp(mode, LINE_SCAN_FORMAT) == 0) {
-        return templateLine.c_str();
+    const int result = fscanf(in, format, scratch);
+    if (result >= 1) {
+        chartowstr(scratch, line);
     }
-    return nullptr;
+    return result;
+}
+
+// Copies in to out byte for byte; false when a write failed. readAll tells
+// whether in was read to its end.
+bool copyStream(FILE* in, FILE* out, bool& readAll) {
+    char buffer[COPY_BUFFER_BYTES];
+    size_t n;
+    bool written = true;
+    while (written && (n = fread(buffer, 1, sizeof buffer, in)) > 0) {
+        written = fwrite(buffer, 1, n, out) == n;
+    }
+    readAll = feof(in) != 0;
+    return written;
+}
+
+// Removes a work file that failed, leaving errno to tell why it failed.
+void dropWorkFile(const std::wstring& workPath) {
+    const int err = errno;
+    deleteFile(workPath.c_str());
+    errno = err;
+}
+
+// Closes and removes a work file whose content is not to be kept.
+void discardWorkFile(FILE* fp, const std::wstring& workPath) {
+    const int err = errno;
+    fclose(fp);
+    errno = err;
+    dropWorkFile(workPath);
 }
 
 }  // namespace
 
+void setPrivateFiles(bool privateToUser) { privateMask = privateToUser ? 022 : 0; }
+
 int createDirectory(const wchar_t* dir) {
     std::string path = toNarrow(dir);
-    return mkdir(path.c_str(), DIRECTORY_MODE) == 0 ? 1 : 0;
+    return mkdir(path.c_str(), DIRECTORY_MODE & ~privateMask) == 0 ? 1 : 0;
 }
 
 int removeDirectoryContents(const std::string& dir, std::string& indent, std::string& errlist) {
@@ -149,33 +192,71 @@ int removeDirectoryAndContents(const std::wstring& dir, std::wstring& errlist) {
 }
 
 int copyFile(const wchar_t* origFile, const wchar_t* newFile) {
+    static const char DESTINATION_FAILED[] = "RLNCH0191E: Unable to open destination file %ls to be copied to";
     const wchar_t* origText = origFile != nullptr ? origFile : L"";
     const wchar_t* newText = newFile != nullptr ? newFile : L"";
     FILE* in = nullptr;
     open_file(in, origText, L"r");
-    if (in == nullptr) fatalErrorExit("RLNCH0190E: Unable to open source file %ls to be copied", origText);
+    // A directory is there but is no file: as a source that cannot be read
+    // to its end it ends with RLNCH0193E below. Whatever else cannot be
+    // opened (a FIFO or a device among them) ends here.
+    const int openErrno = errno;
+    if (in == nullptr && openErrno != EISDIR)
+        fatalErrorExit("RLNCH0190E: Unable to open source file %ls to be copied", origText);
     // Bytes, not text: a copy must never fail because the file is not in
     // the locale's encoding (a launch from the Finder has no LANG at all).
     const std::wstring work = std::wstring(newText) + WORK_FILE_SUFFIX;
     FILE* out = newFile != nullptr ? createWorkFile(work) : nullptr;
     if (out == nullptr) {
-        fclose(in);
-        fatalErrorExit("RLNCH0191E: Unable to open destination file %ls to be copied to", newText);
+        if (in != nullptr) fclose(in);
+        fatalErrorExit(DESTINATION_FAILED, newText);
     }
-    char buffer[COPY_BUFFER_BYTES];
-    size_t n;
-    bool written = true;
-    while (written && (n = fread(buffer, 1, sizeof buffer, in)) > 0) written = fwrite(buffer, 1, n, out) == n;
-    const bool readAll = feof(in) != 0;
-    fclose(in);
-    // A write error, or one that only the final flush and close report (a
-    // full disk), leaves no file behind; nor does a read that stopped early.
-    if (!readAll && written) {
-        finishWorkFile(out, work);
+    bool readAll = false;
+    const bool written = in == nullptr || copyStream(in, out, readAll);
+    if (in != nullptr) {
+        fclose(in);
+    } else {
+        errno = openErrno;
+    }
+    if (written && !readAll) {
+        discardWorkFile(out, work);
         fatalErrorExit("RLNCH0193E: Did not encounter EOF while copying file contents");
     }
-    if (!commitWorkFile(out, work, newText)) fatalErrorExit("RLNCH0192E: Encountered error copying file contents");
+    // A write error, or one that only the final flush and close report (a
+    // full disk), leaves no file behind. A directory in the destination's
+    // place refuses the rename: a destination that cannot be opened.
+    if (!commitWorkFile(out, work, newText)) {
+        fatalErrorExit(errno == EISDIR ? DESTINATION_FAILED : "RLNCH0192E: Encountered error copying file contents",
+                       newText);
+    }
     return 1;
+}
+
+int appendToFile(const std::wstring& path, const std::wstring& text) {
+    FILE* in = nullptr;
+    open_file(in, path.c_str(), L"r+");  // for writing, so a read-only file is refused rather than replaced
+    if (in == nullptr) {
+        return -1;
+    }
+    const std::wstring work = path + WORK_FILE_SUFFIX;
+    FILE* out = createWorkFile(work);
+    struct stat st;
+    bool readAll = false;
+    bool ok = out != nullptr && fstat(fileno(in), &st) == 0;
+    if (ok && fchown(fileno(out), st.st_uid, st.st_gid) != 0) {
+        // Only root may give a file away: the copy is then the user's own.
+    }
+    ok = ok && fchmod(fileno(out), st.st_mode & 07777) == 0 && copyStream(in, out, readAll) && readAll &&
+         putWide(out, text);
+    fclose(in);
+    if (out == nullptr) {
+        return -1;
+    }
+    if (!ok) {
+        discardWorkFile(out, work);
+        return 0;
+    }
+    return commitWorkFile(out, work, path);
 }
 
 int moveFile(const wchar_t* origFile, const wchar_t* newFile) {
@@ -234,35 +315,18 @@ int isExecutable(const wchar_t* file) {
     return (st.st_mode & 0100) != 0 ? 1 : 0;
 }
 
-int readFile(FILE* inX, const wchar_t* mode, std::wstring& inputLineX) {
-    // The properties reader calls this once per line; one scratch area serves
-    // every call instead of a fresh 200 KB allocation each time.
-    static char scratch[READ_SCRATCH_SIZE];
-    inputLineX.clear();
-    const char* format = mode != nullptr ? lineFormat(mode) : nullptr;
-    if (inX == nullptr || format == nullptr) {
-        return EOF;
-    }
-    int result = fscanf(inX, format, scratch);
-    if (result >= 1) {
-        chartowstr(scratch, inputLineX);
-    }
-    return result;
-}
+int readPropertyLine(FILE* in, std::wstring& line) { return readLine(in, PROPERTY_LINE_FORMAT, line); }
 
-void open_wfile(FILE*& inX, const wchar_t* file, const wchar_t* mode) {
-    inX = nullptr;
-    std::string path = toNarrow(file);
-    std::string narrowMode = toNarrow(mode);
-    FILE* fp = fopen(path.c_str(), narrowMode.c_str());
-    if (fp != nullptr) {
-        fwide(fp, 1);
-    }
-    inX = fp;
+int readTemplateLine(FILE* in, std::wstring& line) {
+    // The format meets a line end only at the very start of a file: such
+    // leading empty lines are skipped like every other blank line (with the
+    // indentation after them).
+    const int result = readLine(in, TEMPLATE_LINE_FORMAT, line);
+    return result == 0 ? readPropertyLine(in, line) : result;
 }
 
 int openRegularFile(const char* path, int flags, int mode) {
-    int fd = open(path, flags | O_NONBLOCK | O_CLOEXEC, mode);
+    int fd = open(path, flags | O_NONBLOCK | O_CLOEXEC, static_cast<mode_t>(mode) & ~privateMask);
     if (fd < 0) {
         return -1;
     }
@@ -284,7 +348,7 @@ int openRegularFile(const char* path, int flags, int mode) {
 FILE* createWorkFile(const std::wstring& workPath) {
     std::string path = toNarrow(workPath.c_str());
     unlink(path.c_str());
-    int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666);
+    int fd = openRegularFile(path.c_str(), O_WRONLY | O_CREAT | O_EXCL, FILE_MODE);
     if (fd < 0) {
         return nullptr;
     }
@@ -307,9 +371,7 @@ int finishWorkFile(FILE* fp, const std::wstring& workPath) {
     ok = fflush(fp) == 0 && ok;
     ok = fclose(fp) == 0 && ok;
     if (!ok) {
-        const int err = errno;
-        deleteFile(workPath.c_str());
-        errno = err;
+        dropWorkFile(workPath);
     }
     return ok ? 1 : 0;
 }
@@ -319,9 +381,7 @@ int commitWorkFile(FILE* fp, const std::wstring& workPath, const std::wstring& f
         return 0;
     }
     if (!moveFile(workPath.c_str(), finalPath.c_str())) {
-        const int err = errno;
-        deleteFile(workPath.c_str());
-        errno = err;
+        dropWorkFile(workPath);
         return 0;
     }
     return 1;
@@ -348,6 +408,16 @@ bool readSmallFile(const std::wstring& path, std::string& bytes, size_t limit) {
     close(fd);
     bytes.resize(got);
     return got <= limit;
+}
+
+bool getCurrentDirectory(std::wstring& dir) {
+    char* cwd = getcwd(nullptr, 0);
+    if (cwd == nullptr) {
+        return false;
+    }
+    chartowstr(cwd, dir);
+    free(cwd);
+    return true;
 }
 
 const wchar_t* getUserHome(std::wstring& envHome) {

@@ -10,14 +10,21 @@
 #include <sys/types.h>
 #include <unistd.h>
 
-#include <cctype>
 #include <cerrno>
 #include <climits>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <string>
 
 #include "rcp_launcher.h"
+
+namespace {
+
+// How much of the lock file's beginning is read for the process id.
+const size_t LOCK_TEXT_LIMIT = 4096;
+
+}  // namespace
 
 void createAndOpenLockFile() {
     std::string path;
@@ -91,32 +98,21 @@ void unlockLockFile() {
     }
 }
 
-// Reads the id the way fscanf("%ld") would: blanks skipped, then a number.
-// Returns EOF when the file holds nothing but white space, 0 when the first
-// non-blank is not a number, 1 with *pidOut set otherwise. A number too long
-// for a long is clamped (and names no process).
 int readLockFilePid(long* pidOut) {
-    if (fseek(lockFILE, 0, SEEK_SET) != 0) {
-        return EOF;
-    }
-    clearerr(lockFILE);
-    int ch;
-    while ((ch = fgetc(lockFILE)) != EOF && isspace(ch)) {
-    }
-    if (ch == EOF) {
-        return EOF;
-    }
-    std::string number(1, static_cast<char>(ch));
-    while (number.size() < 32 && (ch = fgetc(lockFILE)) != EOF && isdigit(ch)) {
-        number += static_cast<char>(ch);
-    }
+    // Read as fscanf("%ld") reads it: white space, a sign, digits (leading
+    // zeros and all), a number too long for a long clamped, which names no
+    // process. Only the file's beginning is looked at: the launcher writes an
+    // id and ten blanks, and a planted file of any size must not stall it.
+    char text[LOCK_TEXT_LIMIT + 1];
+    const size_t n = fseek(lockFILE, 0, SEEK_SET) == 0 ? fread(text, 1, LOCK_TEXT_LIMIT, lockFILE) : 0;
+    text[n] = '\0';
     char* end = nullptr;
-    const long value = strtol(number.c_str(), &end, 10);
-    if (end == number.c_str()) {
-        return 0;
+    const long value = strtol(text, &end, 10);
+    if (end != text) {
+        *pidOut = value;
+        return 1;
     }
-    *pidOut = value;
-    return 1;
+    return strspn(text, " \t\n\v\f\r") == n ? EOF : 0;  // nothing but white space, or no number
 }
 
 // Only a missing process (ESRCH) counts as dead; a process of another user

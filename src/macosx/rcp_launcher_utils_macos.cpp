@@ -101,7 +101,7 @@ bool encodeMultibyte(const wchar_t* wcs, std::string& out) {
     return ok;
 }
 
-void replaceAll(std::wstring& in, wchar_t from, wchar_t to) {
+void replaceEveryChar(std::wstring& in, wchar_t from, wchar_t to) {
     for (size_t pos = in.find(from); pos != std::wstring::npos; pos = in.find(from, pos)) in[pos] = to;
 }
 
@@ -125,11 +125,11 @@ int wstrtocs(std::string& str, const std::wstring& wstr) {
 
 void wcstochar(std::string& str, const wchar_t* wcs) { encodeMultibyte(wcs, str); }
 
-void convertBS2S(std::wstring& in) { replaceAll(in, L'\\', L'/'); }
+void convertBS2S(std::wstring& in) { replaceEveryChar(in, L'\\', L'/'); }
 
 void convertToOsSeparator(std::wstring& in) { convertBS2S(in); }
 
-void convertS2BS(std::wstring& in) { replaceAll(in, L'/', BS_CHAR[0]); }
+void convertS2BS(std::wstring& in) { replaceEveryChar(in, L'/', BS_CHAR[0]); }
 
 void open_file(FILE*& inX, const wchar_t* file, const wchar_t* mode) {
     inX = nullptr;

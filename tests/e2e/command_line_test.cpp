@@ -11,10 +11,13 @@ using namespace rcptest;
 // the properties behind each VM argument, system property and -X option, the
 // jvm.properties beside an overriding JVM, the environment keys, and a
 // '-config NAME' extension of the launcher properties (its platform options
-// after the typed ones, its VM options after the typed VM arguments). The
-// child gets exactly this command line and environment, and nothing is
-// logged. (jvm.shareclasses.fullpath names no directory: nothing to empty,
-// nothing to report.)
+// after the typed ones, its VM options after the typed VM arguments), and a
+// HOME relative to the launcher's directory and ending in "/". The child gets
+// exactly this command line (no path holds "//") and environment, and
+// nothing is logged. (jvm.shareclasses.fullpath names no directory: nothing
+// to empty, nothing to report.) Under umask 000 the areas of one user are
+// writable by the user alone (the lock file readable by the user alone), the
+// shared areas of a service installation as the umask leaves them.
 TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
     for (const std::string configuration : {"user", "lockdown", "serial.multiuser", "multiuser", "userpb", "service"}) {
         SCOPED_TRACE("install.configuration=" + configuration);
@@ -32,10 +35,20 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         const std::string jvm2 = sb.path("inst/jvm2/jre/bin/java"), inst = sb.inst;
         sb.installStub(jvm2);
         sb.write("inst/jvm2/jvm.properties", "-Dfrom.jvm=1\nvmarg.z=-Dvz=1\n");
+        const std::string home = sb.home.substr(sb.root.size() + 1) + "/";
+        const mode_t umaskBefore = umask(0);
         Result r = sb.run({{"-consoleLog", "-plugincustomization", "cmd.ini", "-resetconfig", "-foo", "-config", "x",
                             "-vm", jvm2, "-vmargs", "-Duser.vm=1"},
-                           {{"JAVA_HOME", "/opt/java"}, {"LD_LIBRARY_PATH", "/opt/inherited/lib"}}});
+                           {{"JAVA_HOME", "/opt/java"}, {"LD_LIBRARY_PATH", "/opt/inherited/lib"}, {"HOME", home}}});
+        umask(umaskBefore);
         ASSERT_EQ(r.children.size(), 1u) << r.describe();
+        const std::string areas = service ? inst + "/eclipse" : sb.home;
+        for (const auto& [rel, e] : snapshot(areas)) {
+            struct stat st;
+            ASSERT_EQ(lstat((areas + "/" + rel).c_str(), &st), 0);
+            const unsigned mode = (S_ISDIR(st.st_mode) ? 0775u : 0666u) & (service ? 0777u : 0755u);
+            EXPECT_EQ(st.st_mode & 0777u, rel.find(".rcp.lock") != std::string::npos ? 0600u : mode) << rel;
+        }
 
         const std::string ws = service ? inst + "/eclipse/.workspace" : sb.ws, area = service ? "" : "/rcp";
         const V platform = {"-consoleLog", "-plugincustomization", "cmd.ini", "-foo", "-fromconfig", "-data", ws,
@@ -60,7 +73,7 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         for (const char* harness : {"RCP_STUB_RECORD", "ASAN_OPTIONS", "UBSAN_OPTIONS", "LSAN_OPTIONS"})
             env.erase(harness);
         EXPECT_EQ(env, (std::map<std::string, std::string>{
-                           {"HOME", sb.home}, {"USER", "tester"}, {"PATH", "/usr/bin:/bin"}, {"LANG", utf8Locale()},
+                           {"HOME", home}, {"USER", "tester"}, {"PATH", "/usr/bin:/bin"}, {"LANG", utf8Locale()},
                            {"JAVA_HIGH_ZIPFDS", "900"}, {"RCP_DEMO", "hello world"}, {"RCP_COUNTED", "yes"},
                            {"LD_LIBRARY_PATH", inst + "/lib:/opt/inherited/lib:/opt/append/lib"},
                            {"LD_PRELOAD", "/nonexistent/libpre.so"}}));

@@ -173,9 +173,15 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
          "RLNCH0190E: Unable to open source file %S/inst/base/rcpinstall.properties to be copied", EINVAL},
         {"update directory is a file", 0, false, file("%C/org.eclipse.update"),
          create + "%C/org.eclipse.update directory.", EEXIST},
+        // Not replaced either where the user may write its directory.
         {"read-only launcher properties of a package-builder install", 2, true,
-         file("%P", "rcp.base.location=${rcp.home}/base\njvm.location=/j\ninstall.configuration=userpb\n", 0444),
+         steps({file("%P", "rcp.base.location=${rcp.home}/base\njvm.location=/j\ninstall.configuration=userpb\n", 0444),
+                own("%S/inst/rcp", kNobody)}),
          "RLNCH0017E: Could not open %P to append rcp.install.id!", EACCES},
+        // A value quoted whole when it is not cut by a bound on expansion.
+        {"a long value with an unset variable", 0, false,
+         file("%S/inst/base/rcpinstall.properties", "long=" + std::string(300, 'v') + "${env.RCP_UNSET}\n"),
+         "RLNCH0088E: property substitution is invalid (" + std::string(300, 'v') + "${env.RCP_UNSET})", -1},
         // A reset moves the configuration area to "<area>bak" after removing
         // an older backup; when either cannot be done the area stays as it
         // was. Removing a tree follows links, so a dangling link cannot be
@@ -201,6 +207,16 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
         {"fallback log: a FIFO", 0, true, steps({fallback, special(kTmpLog, "")}), "", 0},
         {"fallback log: another user's file open to all", 1, true,
          steps({fallback, file(kTmpLog, "another user's log\n", 0666), own(kTmpLog, kNobody)}), "", 0},
+        // A directory is no file to copy from (it cannot be read) or to (it
+        // cannot be opened for writing). Last: the shared marker stays.
+        {"the user's copy of the shared extension marker is a directory", 0, false,
+         steps({file("%S/inst/shared/eclipse/.eclipseextension"), dir("%W/applications/eclipse/.eclipseextension")}),
+         "RLNCH0191E: Unable to open destination file %W/applications/eclipse/.eclipseextension to be copied to",
+         EISDIR},
+        {"the installation's shared extension marker is a directory", 0, false,
+         steps({[](Sandbox& sb, Launch&) { unlink(sb.path("inst/shared/eclipse/.eclipseextension").c_str()); },
+                dir("%S/inst/shared/eclipse/.eclipseextension")}),
+         "RLNCH0193E: Did not encounter EOF while copying file contents", EISDIR},
     };
     Sandbox sb;
     for (const auto& [name, who, inTmpLog, prepare, text, err] : faults) {
@@ -224,6 +240,12 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
         EXPECT_EQ(inTmpLog ? snapshot(sb.home) : home, home);
         const Tree after = snapshot(sb.root);
         for (const auto& [k, v] : before) EXPECT_EQ(after.count(k) ? after.at(k) : "(gone)", v) << k;
+        // No work file outlives the launch (but the one beside the plain
+        // copy that RLNCH0008E keeps, as designed).
+        if (text.compare(0, 10, "RLNCH0008E") != 0) {
+            for (const auto& [k, v] : after)
+                EXPECT_EQ(before.count(k) ? std::string::npos : k.find(".new"), std::string::npos) << k;
+        }
     }
 }
 

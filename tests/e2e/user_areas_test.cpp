@@ -94,8 +94,10 @@ TEST(UserAreas, LifeOfAWorkspace) {
     EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.y/state") && pathExists(ws + "/../outside/state"));
 
     const std::string platformXml = readText(cfg + "/org.eclipse.update/platform.xml");
+    // A relative rcp.data is taken from the launcher's current directory.
     sb.write(sb.props, "rcp.install.id=ID43\nrcp.base.location=${rcp.home}/base\n"
-                       "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=user\nrcp.data=" + ws + "/\n");
+                       "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=user\nrcp.data=" +
+                           ws.substr(sb.root.size() + 1) + "/\n");
     sb.write("k/jvm.properties", "-Dk=1\n");
     r = sb.run({{"-vm", "k\\jre\\bin\\java"}});
     EXPECT_EQ(r.child().after("-data") + " " + r.child().after("-vm"), ws + " k\\jre\\bin\\java");
@@ -107,20 +109,22 @@ TEST(UserAreas, LifeOfAWorkspace) {
 
 // A platform that has not finished its initial configuration is started
 // with the "config.initial" arguments and the user's "-data" only: neither
-// the typed options nor the typed VM arguments.
+// the typed options nor the typed VM arguments. A relative "-data" is taken
+// from the launcher's current directory.
 TEST(UserAreas, InitialConfigurationLaunch) {
-    // configuration, installation properties, "-data" typed, an initial launch
-    const std::tuple<const char*, const char*, bool, bool> cases[] = {
-        {"user", "", true, true}, {"user", "", false, true}, {"user", "rcp.initial.done=true\n", true, false},
-        {"lockdown", "", true, false}};
+    // configuration, installation properties, "-data" typed (1, or 2 relative), an initial launch
+    const std::tuple<const char*, const char*, int, bool> cases[] = {
+        {"user", "", 1, true}, {"user", "", 0, true}, {"user", "rcp.initial.done=true\n", 2, false},
+        {"lockdown", "", 1, false}};
     Sandbox sb;
     for (const auto& [configuration, installExtra, withData, initial] : cases) {
-        SCOPED_TRACE(std::string(configuration) + " " + installExtra + (withData ? " -data" : ""));
+        SCOPED_TRACE(std::string(configuration) + " " + installExtra + " -data " + std::to_string(withData));
         sb.install(configuration, "config.initial.1=-initialCompleteFlag\nconfig.initial.2=rcp.initial.done\n",
                    installExtra);
         sb.freshHome();
         const std::string data = withData ? sb.home + "/ws" : sb.ws;
-        Result r = sb.run({withData ? V{"-foo", "-data", data, "-vmargs", "-Dx=1"} : V{"-foo", "-vmargs", "-Dx=1"}});
+        const std::string typed = withData == 2 ? data.substr(sb.root.size() + 1) : data;
+        Result r = sb.run({withData ? V{"-foo", "-data", typed, "-vmargs", "-Dx=1"} : V{"-foo", "-vmargs", "-Dx=1"}});
         const V& argv = r.child().argv;
         ASSERT_GT(argv.size(), 4u) << r.describe();
         const V expected = initial ? V{"-initialCompleteFlag", "rcp.initial.done", "-data", data}
@@ -200,6 +204,13 @@ TEST(UserAreas, ProvisioningSequence) {
             sb.write(sb.props, launcherProps(configuration) + "provisioning=true\n" + shipped);
             EXPECT_TRUE(platform(sb.run({{"-foo"}}))) << shipped;
         }
+        // But a launch that had to copy platform.xml again counts as a first
+        // launch, also when the copy fails (larger than a file may grow).
+        unlink((sb.cfg + "/org.eclipse.update/platform.xml").c_str());
+        sb.write(sb.base + "/platform.xml", std::string(9000, 'x') + "\n");
+        Launch limited{{"-foo"}};
+        limited.fileSizeLimit = 4096;
+        EXPECT_FALSE(platform(sb.run(limited)));
         // The installer asks: provisioning at the same level, without
         // "-userProvLaunch", its options passed on to the platform.
         const V installer = {"-rcpLauncherWait", "-provManifest", "m.xml"};

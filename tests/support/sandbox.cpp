@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <grp.h>
+#include <sys/resource.h>
 #ifdef __linux__
 #include <sys/prctl.h>
 #endif
@@ -124,6 +125,9 @@ Result Sandbox::runMany(const std::vector<Launch>& launches) {
         argv.push_back(nullptr);
         if ((pids.emplace_back(fork())) != 0) continue;
         close(gate[1]);
+        const struct rlimit limit = {static_cast<rlim_t>(l.fileSizeLimit), static_cast<rlim_t>(l.fileSizeLimit)};
+        if (l.fileSizeLimit >= 0 && (signal(SIGXFSZ, SIG_IGN) == SIG_ERR || setrlimit(RLIMIT_FSIZE, &limit) != 0))
+            _exit(126);
         char c;
         while (read(gate[0], &c, 1) < 0 && errno == EINTR) continue;
         const int out = open(terminal.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);

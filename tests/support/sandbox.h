@@ -99,6 +99,7 @@ struct Launch {
     std::string program = "";                     // "": the installed launcher
     int user = -1;                                // run as this uid and gid (root only)
     long killAfterUs = -1;                        // SIGKILL the launcher after this delay
+    long fileSizeLimit = -1;                      // no file may grow beyond this (a write beyond it fails)
 };
 
 struct Result {

@@ -10,16 +10,12 @@ TEST(FilesystemTest, Mkdirs) {
     // fits: 1023 characters in short components; one more is refused
     while (fits.size() < 1023) fits += "/" + std::string(std::min<size_t>(200, 1022 - fits.size()), 'd');
     writeText(b + "/file", "x");
-    const mode_t mask = umask(0);
     const std::tuple<std::string, int, std::string> cases[] = {  // path, result, directory made
         {b + "/a/b/c", 1, b + "/a/b/c"}, {b + "/a", 0, b + "/a"}, {b.substr(1) + "/rel/x", 1, b + "/rel/x"},
         {backslashed + "\\bs\\y", 1, b + "/bs/y"}, {b + "//mix\\\\/z//", 1, b + "/mix/z"}, {b + "/file/sub", 0, ""},
         {"", 1, ""}, {fits, 1, fits}, {fits + "e", 0, ""}};
     for (const auto& [path, result, made] : cases)
         EXPECT_TRUE(mkdirs(W(path).c_str()) == result && (made.empty() || isDir(made))) << path.size();
-    umask(mask);
-    struct stat st;
-    EXPECT_TRUE(stat((b + "/a/b").c_str(), &st) == 0 && (st.st_mode & 0777u) == 0775u);
 }
 
 TEST(FilesystemTest, RemovalAndItsErrorList) {

@@ -19,8 +19,9 @@ TEST(LockTest, ContentDecidesMainOrSecondary) {
     const std::string self = std::to_string(getpid()), blanks(10, ' '), none = "2147483647";  // above any pid_max
     const std::tuple<std::string, bool, bool> cases[] = {  // content, a platform runs, "no data"; 1 is another user's
         {"", false, true}, {std::string(14, ' '), false, true}, {" \n\t \n", false, true}, {"   " + self, true, false},
-        {"+" + self, true, false}, {"1" + blanks, true, false}, {"0" + blanks, false, false}, {"-1", false, false},
-        {"99999999999999999999999999", false, false}, {none + blanks, false, false}};
+        {"+" + self, true, false}, {std::string(40, '0') + self, true, false}, {"1" + blanks, true, false},
+        {"0" + blanks, false, false}, {"-1", false, false}, {"99999999999999999999999999", false, false},
+        {none + blanks, false, false}};
     for (const auto& [content, running, noData] : cases) {
         resetLoggingForTest();  // debug output on
         setMainProcess(false);
