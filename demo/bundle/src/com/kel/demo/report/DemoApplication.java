@@ -63,7 +63,7 @@ public final class DemoApplication implements IApplication {
         String[] appArgs = (String[]) context.getArguments().get(IApplicationContext.APPLICATION_ARGS);
         List<String> arguments = Arrays.asList(appArgs == null ? new String[0] : appArgs);
         String workspace = new File(Platform.getInstanceLocation().getURL().getPath()).getPath();
-        String installConfiguration = System.getProperty("rcp.install.config");
+        String installConfiguration = System.getProperty("rcp.install.config", "(not set)");
         reportPlatform(report, product, arguments, new File(workspace));
         report.save();
         // Every launch rewrites the launcher's log in the workspace, a
