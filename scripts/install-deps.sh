@@ -2,10 +2,12 @@
 # Installs what the build, the tests and the demo need, when it is missing.
 # Safe to run again. Package names given as arguments are installed as well.
 #
-# Debian and Ubuntu: apt-get (through sudo when not run as root), including a
-# JVM, the Java compiler and Debian's Equinox launcher and framework for the
-# demo. macOS: Homebrew formulae; Equinox has none, so scripts/test.sh does not
-# run the demo there.
+# Debian and Ubuntu: apt-get (through sudo when not run as root), including
+# for the demo a JVM and the Java compiler, Debian's Eclipse platform (the
+# Equinox launcher and framework, the runtime's bundles and SWT for GTK with
+# its native libraries), Xvfb for a display where there is none, and ps.
+# macOS: Homebrew formulae; Eclipse has none, so scripts/test.sh does not run
+# the demo there.
 set -euo pipefail
 
 if [ "$(uname -s)" = Darwin ]; then
@@ -25,6 +27,9 @@ fi
 
 packages=(cmake make g++ clang libgtest-dev libgmock-dev libbenchmark-dev)
 packages+=(default-jre-headless default-jdk-headless libequinox-launcher-java libeclipse-osgi-java)
+packages+=(libequinox-common-java libeclipse-core-jobs-java libequinox-registry-java libosgi-compendium-java)
+packages+=(libequinox-preferences-java libeclipse-core-contenttype-java libequinox-app-java libeclipse-core-runtime-java)
+packages+=(libswt-gtk-4-java libswt-gtk-4-jni libswt-cairo-gtk-4-jni xvfb procps)
 packages+=("$@")
 
 SUDO=""
