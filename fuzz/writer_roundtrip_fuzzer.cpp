@@ -4,11 +4,9 @@
 // launcher's own path, every argument but the first "-restart" and the first
 // "-resetconfig" as it was typed, and their count. As typed means for every
 // character up to U+FFFF, up to what the reader's grammar takes away on
-// purpose: separators and blanks before a value, blanks after it.
+// purpose (readBack).
 //
 // Input: UTF-16LE code units; a U+0000 unit separates two arguments.
-#include <algorithm>
-
 #include "fuzz_common.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
@@ -33,8 +31,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         convWcharTo8859_1(key, value, line);
         linesFit = linesFit && line.length() <= 2024;
         FUZZ_CHECK(std::all_of(line.begin(), line.end(), [](wchar_t c) { return c >= 0x20 && c <= 0x7e; }));
-        const size_t first = std::min(value.find_first_not_of(L" =:"), value.length());
-        expected.insert(expected.end(), {key, value.substr(first, value.find_last_not_of(L' ') + 1 - first)});
+        expected.insert(expected.end(), {key, readBack(value)});
     }
     expected.insert(expected.end(), {L"argc", std::to_wstring(expected.size() / 2)});
     writeStartupArgs(argc, argv.data(), L".");

@@ -7,7 +7,8 @@
 using namespace rcptest;
 
 // Every input that the builders read, for each install configuration: the
-// launcher's own options (passed on, held back or overriding a property),
+// launcher's own options (passed on, held back or overriding a property;
+// "${rcp.home}" and "${rcp.data}" in them expanded; "-perfJar" the start-up jar),
 // the properties behind each VM argument, system property and -X option, the
 // jvm.properties beside an overriding JVM, the environment keys, and a
 // '-config NAME' extension of the launcher properties (its platform options
@@ -37,8 +38,8 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         sb.write("inst/jvm2/jvm.properties", "-Dfrom.jvm=1\nvmarg.z=-Dvz=1\n");
         const std::string home = sb.home.substr(sb.root.size() + 1) + "/";
         const mode_t umaskBefore = umask(0);
-        Result r = sb.run({{"-consoleLog", "-plugincustomization", "cmd.ini", "-resetconfig", "-foo", "-config", "x",
-                            "-vm", jvm2, "-vmargs", "-Duser.vm=1"},
+        Result r = sb.run({{"-consoleLog", "-plugincustomization", "${rcp.home}/cmd.ini", "-resetconfig", "-foo", "-config",
+                            "x", "-perfJar", "${rcp.data}/perf.jar", "-vm", jvm2, "-vmargs", "-Duser.vm=1"},
                            {{"JAVA_HOME", "/opt/java"}, {"LD_LIBRARY_PATH", "/opt/inherited/lib"}, {"HOME", home}}});
         umask(umaskBefore);
         ASSERT_EQ(r.children.size(), 1u) << r.describe();
@@ -51,7 +52,8 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
         }
 
         const std::string ws = service ? inst + "/eclipse/.workspace" : sb.ws, area = service ? "" : "/rcp";
-        const V platform = {"-consoleLog", "-plugincustomization", "cmd.ini", "-foo", "-fromconfig", "-data", ws,
+        const V platform = {"-consoleLog", "-plugincustomization", inst + "/cmd.ini", "-foo", "-perfJar", ws + "/perf.jar",
+                            "-fromconfig", "-data", ws,
                             "-configuration", service ? inst + "/eclipse/.config" : sb.cfg, "-application",
                             "com.kel.demo.app", "-product", "launcher.product", "-personality", "pers.one"};
         const V vm = {"-Duser.vm=1", "-Dfromconfig=1", "-Dfix=" + ws + "/fix", "-Dvmarg.one=1", "-Dvb=2", "-Dvzero=0",
@@ -62,7 +64,7 @@ TEST(CommandLine, EveryBuilderInputPerInstallConfiguration) {
                       "-cp", inst + "/lib/boot.jar"};
         V expected = {service ? jvm2 : sb.eclipse};
         for (const V& part : service ? std::vector<V>{vm, {"org.eclipse.core.launcher.Main", "-nosplash"}, platform}
-                                     : std::vector<V>{platform, {"-vm", jvm2, "-startup", sb.base + "/launcher.jar",
+                                     : std::vector<V>{platform, {"-vm", jvm2, "-startup", ws + "/perf.jar",
                                                                  "-vmargs"}, vm})
             expected.insert(expected.end(), part.begin(), part.end());
         expected.push_back("-XstartOnFirstThread");

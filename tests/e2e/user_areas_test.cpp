@@ -2,6 +2,8 @@
 // their stability on later launches, resets, an area of another
 // installation, and the launches decided during startup (an initial
 // configuration run, provisioning).
+#include <optional>
+
 #include "sandbox.h"
 
 using namespace rcptest;
@@ -29,8 +31,12 @@ using namespace rcptest;
 // it in the workspace. A launcher told to wait ("-rcpLauncherWait") stays
 // until its platform ends and exits 0 whatever the platform's status. A JVM
 // named with "-vm" brings the jvm.properties three levels above it, also
-// when named with backslashes.
+// when named with backslashes. A package-builder installation without an
+// identifier makes one on its first launch, saves it in its launcher
+// properties and launches with it from then on.
 TEST(UserAreas, LifeOfAWorkspace) {
+    std::optional<::testing::ScopedTrace> step;  // a failure names the step it happened in
+    step.emplace(__FILE__, __LINE__, "a first launch, through a link, without LANG");
     Sandbox sb("user", "com.kel.rcp.core.locale=fr_FR\ncom.kel.rcp.core.bidi=true\nconfig.rs.1=-resetconfig\n",
                "os.value.macosx=mac\nos.value.win32=win\\\n    continued\nos.value.linux=tux\nresetDir.a=org.x\nresetDir.b=../../../outside\n\n"
                "# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n");
@@ -38,7 +44,8 @@ TEST(UserAreas, LifeOfAWorkspace) {
     sb.write(sb.base + "/rcpinstall.properties", "\n\n" + readText(sb.base + "/rcpinstall.properties"));
     sb.write(sb.base + "/platform.xml",
              "\n<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n  <site url=\"platform:/base/\" enabled=\"true\">"
-             "\n    <feature id=\"${jvm.feature.id}\" version=\"1.0\"/>\n  </site>\n</config>\n"
+             "\n    <feature id=\"${jvm.feature.id}\" version=\"1.0\"/>\n    <feature id=\"${jvm.parent.feature.id}\"/>"
+             "\n  </site>\n</config>\n"
              "<!-- caf\xe9 \xc3\xb6 -->\n");
     sb.write(sb.base + "/config.ini", "osgi.bundles=x\n# caf\xe9 \xc3\xb6\n");
     sb.write("links/rcp/rcplauncher.properties", "rcp.install.id=WRONG\n");
@@ -46,7 +53,6 @@ TEST(UserAreas, LifeOfAWorkspace) {
     ASSERT_EQ(symlink(sb.inst.c_str(), sb.path("links/inst").c_str()), 0);
     Result r = sb.run({{"-resetconfig", "-debug", "a b", longArg}, {{"LANG", ""}}, sb.path("links/rcp/rcplauncher")});
     ASSERT_EQ(r.status, 0) << r.describe();
-    EXPECT_EQ(r.tmpLog, "");
     const std::string w = "KEL/RCP/ID42/tester/";
     V tree = {"KEL/", "KEL/RCP/", "KEL/RCP/ID42/", w};
     for (const char* p : {".config/", ".config/args.properties", ".config/config.ini", ".config/org.eclipse.update/",
@@ -57,16 +63,16 @@ TEST(UserAreas, LifeOfAWorkspace) {
     EXPECT_EQ(names(snapshot(sb.home)), tree);
     EXPECT_EQ(readText(cfg + "/args.properties"),
               "arg0=" + sb.launcher + "\narg1=-debug\narg2=a b\narg3=" + longArg + "\nargc=4\n");
-    EXPECT_NE(r.log.find(longArg), std::string::npos) << "the debug log shows the child's arguments";
     EXPECT_EQ(readText(cfg + "/config.ini"), "osgi.bundles=x\n# caf\xe9 \xc3\xb6\n");
     EXPECT_EQ(readText(cfg + "/org.eclipse.update/platform.xml"),
               "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n<site url=\"platform:/base/\" enabled=\"true\">\n"
-              "<feature>\n</site>\n</config>\n<!-- caf\xe9 \xc3\xb6 -->\n");
+              "<feature>\n<feature>\n</site>\n</config>\n<!-- caf\xe9 \xc3\xb6 -->\n");
     EXPECT_EQ(readText(cfg + "/rcpinstall.properties"),
               kInstallProps + "os.value=mac\nresetDir.a=org.x\nresetDir.b=../../../outside\n# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n"
                               "rcp.install.id=ID42\nvm=${rcp.home}/jre/bin/java\nrcp.base.location=${rcp.home}/base\n"
                               "install.configuration=user\ncom.kel.rcp.core.locale=fr_FR\ncom.kel.rcp.core.bidi=true\n");
 
+    step.emplace(__FILE__, __LINE__, "a later launch keeps every file; -resetconfig from the properties; -console");
     sb.write(cfg + "/marker", "old area");
     sb.write(ws + "/.metadata/.plugins/org.x/state", "x");
     sb.write(ws + "/.metadata/.plugins/org.y/state", "y");
@@ -75,47 +81,60 @@ TEST(UserAreas, LifeOfAWorkspace) {
     for (const char* f : {"/config.ini", "/platform.xml", "/rcpinstall.properties"}) sb.write(sb.base + f, "new=1\n");
     sb.write(sb.props, launcherProps("user") + "config.rs.1=-resetconfig\ncom.kel.rcp.core.bidi=true\n");
     r = sb.run({{"-config", "rs", "-console"}, {}, sb.path("links/inst/rcp/rcplauncher")});
-    EXPECT_TRUE(r.child().index("-Drcp.home=" + sb.inst) != -1 && r.child().reapedByLauncher) << r.describe();
+    EXPECT_NE(r.child().index("-Drcp.home=" + sb.inst), -1) << r.describe();
+    EXPECT_TRUE(r.child().reapedByLauncher);
     before[".config/args.properties"] = "uid " + std::to_string(geteuid()) + " file\narg0=" + sb.launcher +
                                         "\narg1=-config\narg2=rs\narg3=-console\nargc=4\n";
     EXPECT_EQ(snapshot(ws), before);
     EXPECT_EQ(r.log, "\n");
 
+    step.emplace(__FILE__, __LINE__, "a typed -resetconfig, -rcpLauncherWait");
     sb.write(sb.base + "/config.ini", "fresh=1\n");
     r = sb.run({{"-resetconfig", "-rcpLauncherWait", "-vm"}, {{"RCP_STUB_SLEEP", "1"}, {"RCP_STUB_EXIT", "7"}}});
-    EXPECT_TRUE(r.status == 0 && r.child().reapedByLauncher && r.child().index("-resetconfig") == -1) << r.describe();
+    EXPECT_EQ(r.status, 0) << r.describe();
+    EXPECT_TRUE(r.child().reapedByLauncher);
+    EXPECT_EQ(r.child().index("-resetconfig"), -1);
     EXPECT_EQ(r.child().after("-vm"), sb.jvm);  // "-vm" without a value is no override
     EXPECT_EQ(readText(ws + "/.configbak/marker"), "old area");
     EXPECT_EQ(names(snapshot(cfg)), (V{"args.properties", "config.ini", "org.eclipse.update/",
                                        "org.eclipse.update/platform.xml", "rcpinstall.properties"}));
     EXPECT_EQ(readText(cfg + "/config.ini"), "fresh=1\n");
-    EXPECT_EQ(readText(cfg + "/args.properties"), "arg0=" + sb.launcher + "\narg1=-rcpLauncherWait\narg2=-vm\nargc=3\n");
     EXPECT_FALSE(pathExists(ws + "/.metadata/.plugins/org.x"));
-    EXPECT_TRUE(pathExists(ws + "/.metadata/.plugins/org.y/state") && pathExists(ws + "/../outside/state"));
+    for (const std::string kept : {"/.metadata/.plugins/org.y/state", "/../outside/state"})
+        EXPECT_TRUE(pathExists(ws + kept)) << kept;
 
+    step.emplace(__FILE__, __LINE__, "another installation's area, a relative rcp.data, -vm with backslashes");
     const std::string platformXml = readText(cfg + "/org.eclipse.update/platform.xml");
-    // A relative rcp.data is taken from the launcher's current directory.
+    // A relative rcp.data (made of a placeholder, one trailing separator
+    // dropped) is taken from the launcher's current directory.
     sb.write(sb.props, "rcp.install.id=ID43\nrcp.base.location=${rcp.home}/base\n"
-                       "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=user\nrcp.data=" +
-                           ws.substr(sb.root.size() + 1) + "/\n");
+                       "jvm.location=${rcp.home}/jre/bin/java\ninstall.configuration=user\nrcp.data=${env.WS}\\\\\n");
     sb.write("k/jvm.properties", "-Dk=1\n");
-    r = sb.run({{"-vm", "k\\jre\\bin\\java"}});
+    r = sb.run({{"-vm", "k\\jre\\bin\\java"}, {{"WS", ws.substr(sb.root.size() + 1)}}});
     EXPECT_EQ(r.child().after("-data") + " " + r.child().after("-vm"), ws + " k\\jre\\bin\\java");
-    EXPECT_TRUE(r.child().index("-Dcom.kel.rcp.install.id=ID43") != -1 && r.child().index("-Dk=1") != -1);
+    for (const char* arg : {"-Dcom.kel.rcp.install.id=ID43", "-Dk=1"}) EXPECT_NE(r.child().index(arg), -1) << arg;
     EXPECT_EQ(readText(ws + "/platform.xml.old"), platformXml);
     EXPECT_NE(readText(ws + "/.configbak/rcpinstall.properties").find("rcp.install.id=ID42\n"), std::string::npos);
     EXPECT_NE(readText(cfg + "/rcpinstall.properties").find("rcp.install.id=ID43\n"), std::string::npos);
+
+    step.emplace(__FILE__, __LINE__, "a package-builder installation names itself");
+    const std::string pb = "rcp.base.location=${rcp.home}/base\njvm.location=/j\ninstall.configuration=userpb\n";
+    sb.write(sb.props, pb);
+    const std::string named = sb.run().child().after("-data");  // <home>/KEL/RCP/<the new identifier>/tester
+    const std::string saved = pb + "rcp.install.id=" + named.substr(sb.home.size() + 9, named.size() - sb.home.size() - 16);
+    EXPECT_EQ(readText(sb.props), saved + "\n");
+    EXPECT_EQ(sb.run().child().after("-data"), named);
+    EXPECT_EQ(readText(sb.props), saved + "\n");
 }
 
 // A platform that has not finished its initial configuration is started
 // with the "config.initial" arguments and the user's "-data" only: neither
-// the typed options nor the typed VM arguments. A relative "-data" is taken
-// from the launcher's current directory.
+// the typed options nor the typed VM arguments.
 TEST(UserAreas, InitialConfigurationLaunch) {
-    // configuration, installation properties, "-data" typed (1, or 2 relative), an initial launch
-    const std::tuple<const char*, const char*, int, bool> cases[] = {
-        {"user", "", 1, true}, {"user", "", 0, true}, {"user", "rcp.initial.done=true\n", 2, false},
-        {"lockdown", "", 1, false}};
+    // configuration, installation properties, "-data" typed, an initial launch
+    const std::tuple<const char*, const char*, bool, bool> cases[] = {
+        {"user", "", true, true}, {"user", "", false, true}, {"user", "rcp.initial.done=true\n", true, false},
+        {"lockdown", "", true, false}};
     Sandbox sb;
     for (const auto& [configuration, installExtra, withData, initial] : cases) {
         SCOPED_TRACE(std::string(configuration) + " " + installExtra + " -data " + std::to_string(withData));
@@ -123,8 +142,7 @@ TEST(UserAreas, InitialConfigurationLaunch) {
                    installExtra);
         sb.freshHome();
         const std::string data = withData ? sb.home + "/ws" : sb.ws;
-        const std::string typed = withData == 2 ? data.substr(sb.root.size() + 1) : data;
-        Result r = sb.run({withData ? V{"-foo", "-data", typed, "-vmargs", "-Dx=1"} : V{"-foo", "-vmargs", "-Dx=1"}});
+        Result r = sb.run({withData ? V{"-foo", "-data", data, "-vmargs", "-Dx=1"} : V{"-foo", "-vmargs", "-Dx=1"}});
         const V& argv = r.child().argv;
         ASSERT_GT(argv.size(), 4u) << r.describe();
         const V expected = initial ? V{"-initialCompleteFlag", "rcp.initial.done", "-data", data}
@@ -206,11 +224,16 @@ TEST(UserAreas, ProvisioningSequence) {
         }
         // But a launch that had to copy platform.xml again counts as a first
         // launch, also when the copy fails (larger than a file may grow).
-        unlink((sb.cfg + "/org.eclipse.update/platform.xml").c_str());
+        // Under a managed update policy the platform writes its own: no copy.
+        const std::string xml = sb.cfg + "/org.eclipse.update/platform.xml";
+        unlink(xml.c_str());
         sb.write(sb.base + "/platform.xml", std::string(9000, 'x') + "\n");
         Launch limited{{"-foo"}};
         limited.fileSizeLimit = 4096;
         EXPECT_FALSE(platform(sb.run(limited)));
+        sb.write(sb.props, launcherProps(configuration) + "provisioning=true\nupdate.policy.managed=false\n");
+        EXPECT_TRUE(platform(sb.run({{"-foo"}})));
+        EXPECT_FALSE(pathExists(xml));
         // The installer asks: provisioning at the same level, without
         // "-userProvLaunch", its options passed on to the platform.
         const V installer = {"-rcpLauncherWait", "-provManifest", "m.xml"};

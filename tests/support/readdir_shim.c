@@ -1,26 +1,22 @@
 // Preloaded (LD_PRELOAD) into a dynamically linked launcher, this plays
 // HFS+, on which a directory listing that goes on while entries are being
-// removed may skip entries: after each unlink or rmdir made while a listing
-// is open, the next readdir passes over one entry (and over "." and ".." on
-// the way).
+// removed may skip entries: after each unlink or rmdir, the listing read next
+// passes over one entry (and over "." and ".." on the way), until a listing
+// is opened afresh. A removal that reads every name of a directory before it
+// removes any never meets a skip; one that removes while it reads leaves
+// entries behind.
 #define _GNU_SOURCE
 #include <dirent.h>
 #include <dlfcn.h>
 #include <string.h>
 
-static int openListings, skips;
+static int skips;
 
 #define NEXT(name, type) ((type)dlsym(RTLD_NEXT, name))
 
 DIR* opendir(const char* path) {
-    DIR* dir = NEXT("opendir", DIR * (*)(const char*))(path);
-    openListings += dir != NULL;
-    return dir;
-}
-
-int closedir(DIR* dir) {
-    openListings--;
-    return NEXT("closedir", int (*)(DIR*))(dir);
+    skips = 0;
+    return NEXT("opendir", DIR * (*)(const char*))(path);
 }
 
 struct dirent* readdir(DIR* dir) {
@@ -31,9 +27,8 @@ struct dirent* readdir(DIR* dir) {
     return entry;
 }
 
-// A removal counts while a listing is open.
 static int removal(int result) {
-    skips += result == 0 && openListings > 0;
+    skips += result == 0;
     return result;
 }
 

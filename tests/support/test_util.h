@@ -18,21 +18,17 @@
 namespace rcptest {
 
 // Links are not followed.
-inline bool pathExists(const std::string& path) {
-    struct stat st;
-    return lstat(path.c_str(), &st) == 0;
+inline std::filesystem::file_status entryStatus(const std::string& path) {
+    std::error_code ignored;
+    return std::filesystem::symlink_status(path, ignored);
 }
+inline bool pathExists(const std::string& path) { return std::filesystem::exists(entryStatus(path)); }
+inline bool isDir(const std::string& path) { return std::filesystem::is_directory(entryStatus(path)); }
 
-inline bool isDir(const std::string& path) {
-    struct stat st;
-    return lstat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
-}
-
-// Every missing level, mode 0755.
+// Every missing level.
 inline void makeDirs(const std::string& path) {
-    for (size_t slash = path.find('/', 1); slash != std::string::npos; slash = path.find('/', slash + 1))
-        mkdir(path.substr(0, slash).c_str(), 0755);
-    mkdir(path.c_str(), 0755);
+    std::error_code ignored;
+    std::filesystem::create_directories(path, ignored);
 }
 
 // A file, or a directory with everything below it: read-only directories are

@@ -4,21 +4,16 @@
 // code writes are quoted as they stand.
 #include <gtest/gtest.h>
 
-#include <filesystem>
-#include <fstream>
 #include <map>
 #include <regex>
-#include <sstream>
 
-static std::string slurp(const std::filesystem::path& p) {
-    std::ostringstream out;
-    out << std::ifstream(p).rdbuf();
-    return out.str();
-}
+#include "test_util.h"
+
+using rcptest::readText;
 
 TEST(DocsTest, MessageCatalogueMatchesTheCode) {
     const std::filesystem::path root = RCP_SOURCE_DIR;
-    const std::string docs = slurp(root / "docs" / "messages.md"), id = "(RLNCH[0-9]{4}[A-Z])";
+    const std::string docs = readText(root / "docs" / "messages.md"), id = "(RLNCH[0-9]{4}[A-Z])";
     // A text: a literal that opens with the identifier (or "\n" and it), up to its end or first escape.
     const std::regex anyId(id), heading("\n#+ " + id), text("\"(?:\\\\n)?(RLNCH[0-9]{4}[A-Z][^\"\\\\\\n]*)");
     using Matches = std::sregex_iterator;
@@ -26,7 +21,7 @@ TEST(DocsTest, MessageCatalogueMatchesTheCode) {
     for (Matches m(docs.begin(), docs.end(), heading), end; m != end; ++m) headings[m->str(1)]++;
     for (const char* dir : {"common", "src"})
         for (const auto& file : std::filesystem::recursive_directory_iterator(root / dir)) {
-            const std::string s = slurp(file.path());
+            const std::string s = readText(file.path());
             for (Matches m(s.begin(), s.end(), anyId), end; m != end; ++m) used[m->str(1)]++;
             for (Matches m(s.begin(), s.end(), text), end; m != end; ++m)
                 EXPECT_NE(docs.find(m->str(1)), std::string::npos) << "not quoted: " << m->str(1);

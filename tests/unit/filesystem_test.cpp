@@ -1,4 +1,5 @@
-// The file-system layer: mkdirs, and tree removal with its error list.
+// The file-system layer: mkdirs, and tree removal with its error list (the
+// reset's list of directories to remove among them).
 #include <algorithm>
 
 #include "unit_support.h"
@@ -14,8 +15,10 @@ TEST(FilesystemTest, Mkdirs) {
         {b + "/a/b/c", 1, b + "/a/b/c"}, {b + "/a", 0, b + "/a"}, {b.substr(1) + "/rel/x", 1, b + "/rel/x"},
         {backslashed + "\\bs\\y", 1, b + "/bs/y"}, {b + "//mix\\\\/z//", 1, b + "/mix/z"}, {b + "/file/sub", 0, ""},
         {"", 1, ""}, {fits, 1, fits}, {fits + "e", 0, ""}};
-    for (const auto& [path, result, made] : cases)
-        EXPECT_TRUE(mkdirs(W(path).c_str()) == result && (made.empty() || isDir(made))) << path.size();
+    for (const auto& [path, result, made] : cases) {
+        EXPECT_EQ(mkdirs(W(path).c_str()), result) << path.size();
+        EXPECT_EQ(isDir(made), !made.empty()) << made;
+    }
 }
 
 TEST(FilesystemTest, RemovalAndItsErrorList) {
@@ -31,10 +34,15 @@ TEST(FilesystemTest, RemovalAndItsErrorList) {
     // A link is followed into its target, which is emptied; the link, the target and the top directory stay.
     const std::wstring link = error("Can't delete dir ", "top/dirlink", ENOTDIR), failed = errlist;
     const std::wstring dangling = error("Can't stat ", "top/dangling", ENOENT);
-    EXPECT_TRUE(errlist == link + dangling || errlist == dangling + link) << errlist.size();
-    EXPECT_TRUE(isDir(tmp.sub("target")) && !pathExists(tmp.sub("target/sub")) && !pathExists(tmp.sub("top/sub")));
+    EXPECT_EQ(errlist == dangling + link ? link + dangling : errlist, link + dangling);  // in either order
+    EXPECT_TRUE(isDir(tmp.sub("target")));
+    for (const char* gone : {"target/sub", "top/sub"}) EXPECT_FALSE(pathExists(tmp.sub(gone))) << gone;
     for (const char* l : {"top/dirlink", "top/dangling"}) unlink(tmp.sub(l).c_str());
-    EXPECT_TRUE(removeDirectoryAndContents(W(tmp.sub("top")), errlist) == 1 && errlist == failed);
+    EXPECT_EQ(removeDirectoryAndContents(W(tmp.sub("top")), errlist), 1);
+    EXPECT_EQ(errlist, failed);
     EXPECT_EQ(removeDirectoryContents(W(tmp.sub("top")), errlist), 0);
     EXPECT_EQ(errlist, error("Error in ", "top", ENOENT));
+    // A reset removes the plug-in state directories its installation lists: no list, no reset.
+    expectFatal({{[&] { resetMetaDataDirs(L"/no/ws", L"/no/ws/.config", L"/no/core"); },
+                  "RLNCH0106E: Unable to locate /no/core/rcpinstall.properties file. : "}});
 }

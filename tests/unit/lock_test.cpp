@@ -28,7 +28,8 @@ TEST(LockTest, ContentDecidesMainOrSecondary) {
         writeText(ws.sub(".sid"), "marker");  // the main launcher deletes it
         openLock(ws, content);
         lockLockFile(W(ws.sub(".sid")));
-        EXPECT_TRUE(isMainProcess() != running && pathExists(ws.sub(".sid")) == running) << content;
+        EXPECT_EQ(isMainProcess(), !running) << content;
+        EXPECT_EQ(pathExists(ws.sub(".sid")), running) << content;
         EXPECT_EQ(getLogQueue(), "RLNCH0090E: Existing platform lock file found - checking validity.\n" +
                                      std::string(noData ? "RLNCH0091E: No data in the platform lock file.\n" : ""));
     }
@@ -49,12 +50,14 @@ TEST(LockTest, IdsAreWrittenOverOlderOnesWithoutStrayDigits) {
     EXPECT_EQ(readText(file), "");
     setMainProcess(true);
     for (int id : {1234567, 12345}) populateLockFile(id);
-    EXPECT_TRUE(readText(file) == "12345  " + blanks && readLockFilePid(&readBack) == 1 && readBack == 12345);
+    EXPECT_EQ(readText(file), "12345  " + blanks);
+    EXPECT_EQ(std::make_pair(readLockFilePid(&readBack), readBack), std::make_pair(1, 12345L));
     populateLockFile(42);  // reading and writing alternate on the one stream
     EXPECT_EQ(readText(file), "42     " + blanks);
     invalidateLockFile();
-    EXPECT_TRUE(readText(file) == std::string(17, ' ') && readLockFilePid(&readBack) == EOF);
+    EXPECT_EQ(readText(file), std::string(17, ' '));
+    EXPECT_EQ(readLockFilePid(&readBack), EOF);
     openLock(ws, "77");  // a short file is blanked to 14 characters
     invalidateLockFile();
-    EXPECT_TRUE(readText(file) == std::string(14, ' ') && getLogQueue().empty());
+    EXPECT_EQ(readText(file) + getLogQueue(), std::string(14, ' '));  // and nothing logged
 }

@@ -1,5 +1,6 @@
 // Properties files: the reader's grammar and selections, the writer's
-// escaping, "${...}" placeholders and "-config NAME" extensions.
+// escaping, "${...}" placeholders (and the bounds on their expansion) and
+// "-config NAME" extensions.
 #include "unit_support.h"
 
 // The pairs the reader makes of text.
@@ -39,7 +40,8 @@ TEST(PropertiesTest, SelectionsGrowAndStopAtAnEmptyKey) {
     String* sel = findProperties(L"p.", props);
     size_t n = 0;
     while (sel[n][0] != 0) n += 2;
-    EXPECT_TRUE(n == 40 && !wcscmp(sel[1], L"0") && !wcscmp(sel[39], L"38")) << n;
+    EXPECT_EQ(n, 40u);
+    EXPECT_EQ(std::wstring(sel[1]) + L" " + sel[39], L"0 38");
     free(sel);
 }
 
@@ -69,7 +71,8 @@ TEST(PropertiesTest, Placeholders) {
         {L"${prop.a}${prop.missing}", false, L"${prop.b}${prop.missing}"},  // inserted after it: not
         {L"${prop.p}", false, L"${prop.p}"}, {L"${prop.q}", false, L"qqqqqqqqqqq${prop.q}"},  // the tenth round stops
     };
-    for (auto [s, ok, out] : user) EXPECT_TRUE(replaceUserPlaceholders(s, props) == ok && s == out) << s;
+    // (the pair is made once the call has changed s)
+    for (auto [s, ok, out] : user) EXPECT_EQ(std::make_pair(replaceUserPlaceholders(s, props), s), std::make_pair(ok, out));
     Props tree{{L"a8", L"x"}};  // values that multiply: a0 ... a7 each hold 60 copies of the next one
     for (int i = 0; i < 8; ++i) {
         std::wstring copies;
@@ -77,7 +80,13 @@ TEST(PropertiesTest, Placeholders) {
         tree.add({{L"a" + std::to_wstring(i), copies}});
     }
     std::wstring runaway = L"${prop.a0}";
-    EXPECT_TRUE(!replaceUserPlaceholders(runaway, tree) && runaway.size() <= 300000u) << runaway.size();
+    EXPECT_FALSE(replaceUserPlaceholders(runaway, tree));
+    EXPECT_LE(runaway.size(), 300000u);
+    Props copies{{L"a0", std::wstring(100000, L'a')}};  // 4,000 copies of one large value
+    for (int i = 1; i <= 4000; ++i) copies.add({{L"a" + std::to_wstring(i), L"${prop.a0}"}});
+    // the expansion of a launch's installation properties is bounded as a whole, the quoted value cut
+    expectFatal({{[&] { replacePlaceholdersInRcpInstallProp(L"/ws", L"/opt", copies); },
+                  "RLNCH0088E: property substitution is invalid (" + std::string(256, 'a') + "...) : "}});
 }
 
 TEST(PropertiesTest, ConfigExtensions) {
@@ -89,7 +98,9 @@ TEST(PropertiesTest, ConfigExtensions) {
     Strings argv{L"p", L"-vmargs", L"-vm", L"-config", L"x"}, newargs;
     int cargc = 0;
     wchar_t** cargv = nullptr;
-    EXPECT_TRUE(addConfigExtentionsToArg(&cargc, &cargv, 5, argvOf(argv).data(), props, newargs));
+    std::vector<wchar_t*> av(argv.size() + 1);  // closed by a null pointer
+    for (size_t i = 0; i < argv.size(); i++) av[i] = &argv[i][0];
+    EXPECT_TRUE(addConfigExtentionsToArg(&cargc, &cargv, 5, av.data(), props, newargs));
     EXPECT_EQ(Strings(cargv, cargv + cargc), (Strings{L"p", L"-a", L"-vmargs", L"-vm", L"-X"}));
     free(cargv);
 }

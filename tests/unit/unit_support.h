@@ -1,5 +1,5 @@
 // Shared by the unit tests: the launcher's globals back to a known state,
-// wide text, owned properties arrays, argument vectors, and the check that
+// wide text, owned properties arrays, and the check that
 // calls end the launch through the fatal path with their message.
 #ifndef RCP_UNIT_SUPPORT_H
 #define RCP_UNIT_SUPPORT_H
@@ -38,14 +38,6 @@ struct Props : std::vector<String> {
         for (const auto& [key, value] : pairs) insert(end(), {copyString(key.c_str()), copyString(value.c_str())});
     }
 };
-
-// An argument vector over the strings of args, closed by a null pointer.
-inline std::vector<wchar_t*> argvOf(Strings& args) {
-    std::vector<wchar_t*> argv;
-    for (std::wstring& a : args) argv.push_back(&a[0]);
-    argv.push_back(nullptr);
-    return argv;
-}
 
 // Each call must end the process with status 255 and log its message; the
 // log goes to a directory of its own instead of /tmp/rcplauncher.log.
