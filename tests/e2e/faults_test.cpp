@@ -236,8 +236,7 @@ TEST(Faults, EveryFailureEndsWithItsMessageAndKeepsWhatWasThere) {
         const std::string planted = entry(kTmpLog), line = expand(sb, text) + " : " + (err < 0 ? "" : strerror(err));
         const Tree before = snapshot(sb.root), home = snapshot(sb.home);
         Result r = sb.run(o);
-        EXPECT_EQ(r.status, 255) << r.describe();
-        EXPECT_EQ(r.children.size(), 0u);
+        EXPECT_EQ(std::make_pair(r.status, r.children.size()), std::make_pair(255, size_t{0})) << r.describe();
         EXPECT_EQ(r.tmpLog.empty(), !inTmpLog) << r.describe();
         // The line ends with the system's text for the error (for err -1 whatever it is).
         const std::string last = lastLine(inTmpLog ? r.tmpLog : r.log);
