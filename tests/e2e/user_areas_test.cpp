@@ -38,7 +38,7 @@ TEST(UserAreas, LifeOfAWorkspace) {
     std::optional<::testing::ScopedTrace> step;  // a failure names the step it happened in
     step.emplace(__FILE__, __LINE__, "a first launch, through a link, without LANG");
     Sandbox sb("user", "com.kel.rcp.core.locale=fr_FR\ncom.kel.rcp.core.bidi=true\nconfig.rs.1=-resetconfig\n",
-               "os.value.macosx=mac\nos.value.win32=win\\\n    continued\nos.value.linux=tux\nresetDir.a=org.x\nresetDir.b=../../../outside\n\n"
+               "os.value.macosx=mac\nos.value.win32=win\\\n    continued\nos.value.linux=tux\nresetDir.b=../../../outside\nresetDir.a=org.x\n\n"
                "# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n");
     const std::string ws = sb.ws, cfg = sb.cfg, longArg = "/a/long/argument/" + std::string(3000, 'x');
     sb.write(sb.base + "/rcpinstall.properties", "\n\n" + readText(sb.base + "/rcpinstall.properties"));
@@ -68,7 +68,7 @@ TEST(UserAreas, LifeOfAWorkspace) {
               "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<config>\n<site url=\"platform:/base/\" enabled=\"true\">\n"
               "<feature>\n<feature>\n</site>\n</config>\n<!-- caf\xe9 \xc3\xb6 -->\n");
     EXPECT_EQ(readText(cfg + "/rcpinstall.properties"),
-              kInstallProps + "os.value=mac\nresetDir.a=org.x\nresetDir.b=../../../outside\n# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n"
+              kInstallProps + "os.value=mac\nresetDir.b=../../../outside\nresetDir.a=org.x\n# trailing comment, Gr\xc3\xbc\xc3\x9f Gott, caf\xe9\n"
                               "rcp.install.id=ID42\nvm=${rcp.home}/jre/bin/java\nrcp.base.location=${rcp.home}/base\n"
                               "install.configuration=user\ncom.kel.rcp.core.locale=fr_FR\ncom.kel.rcp.core.bidi=true\n");
 
@@ -215,12 +215,13 @@ TEST(UserAreas, ProvisioningSequence) {
 
         // The provisioned level recorded in the user's properties, and the
         // installation ships no level or the same one: nothing new, so the
-        // platform itself starts, and the shared classes stay.
+        // platform itself starts, and the shared classes stay. (A launcher
+        // told to wait is no installer's request without "-provManifest".)
         sb.write(userProps, readText(userProps) + "provisioning.manifest.version=2\n");
         sb.write(shared + "/cache.bin", "x");
         for (const std::string shipped : {"", "provisioning.manifest.version=2\n"}) {
             sb.write(sb.props, launcherProps(configuration) + "provisioning=true\n" + shipped);
-            EXPECT_TRUE(platform(sb.run({{"-foo"}}))) << shipped;
+            EXPECT_TRUE(platform(sb.run({{"-rcpLauncherWait"}}))) << shipped;
         }
         // But a launch that had to copy platform.xml again counts as a first
         // launch, also when the copy fails (larger than a file may grow).
