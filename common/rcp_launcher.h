@@ -166,8 +166,9 @@ bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArra
 struct InstallCfgTraits {
     const wchar_t* name;           // its "install.configuration" word and -Drcp.install.config (null: none)
     const wchar_t* coreSubFolder;  // its templates' folder below <core>/config
-    const wchar_t* workspace;      // its areas below the installation directory; null: the user's own
-    const wchar_t* configArea;     // (-data, rcp.data or the home directory), which no one else may write
+    const wchar_t* workspace;      // its workspace below the installation directory; null: the user's
+                                   // own (-data, rcp.data or the home directory)
+    const wchar_t* configArea;     // its configuration area there; null: "<workspace>/.config"
     bool service;                  // the JVM itself is the child, with class path and main class
     bool initialLaunch;            // it may need an initial launch ("config.initial.N")
     bool provisions;               // it provisions a new level or a user's first launch
@@ -175,6 +176,9 @@ struct InstallCfgTraits {
 };
 // The row of eConfig.
 const InstallCfgTraits& installCfgTraits();
+// The areas of eConfig belong to one user (all but the service
+// configurations), so no one else may write what the launcher creates there.
+bool areasOfOneUser();
 // service or multiuser_service: the JVM itself is the child, with the class
 // path and main class on its command line, instead of the Eclipse executable.
 bool isServiceConfig();

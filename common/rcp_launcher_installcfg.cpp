@@ -33,6 +33,8 @@ const InstallCfgTraits& installCfgTraits() { return TRAITS[eConfig - service]; }
 
 bool isServiceConfig() { return installCfgTraits().service; }
 
+bool areasOfOneUser() { return installCfgTraits().workspace == nullptr; }
+
 bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArray, bool muservice) {
     const wchar_t* value = findProperty(CONFIGURATION_PROPERTY, rcpInstallPropertiesArray);
     if (value == nullptr) {
@@ -52,6 +54,6 @@ bool SetInstallConfiguration(const std::vector<String>& rcpInstallPropertiesArra
     if (muservice) eConfig = multiuser_service;
     // Areas of one user are never writable by others; the shared areas of
     // the service configurations follow the umask.
-    setPrivateFiles(installCfgTraits().workspace == nullptr);
+    setPrivateFiles(areasOfOneUser());
     return true;
 }

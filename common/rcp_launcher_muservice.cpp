@@ -44,6 +44,8 @@ void createMUServiceWkspc(wstring& workspaceLocation, const wstring& installDir,
     }
 
     createPlatformXML(configLocation, baseLocation, rcpLauncherPropertiesArray);
+    // Back to the rule of this launch's own areas.
+    setPrivateFiles(areasOfOneUser());
 }
 
 // The service start ("-initMUService"), in place of the ordinary startup:
